@@ -1,0 +1,38 @@
+// The hardware-information log: debug level, trace lines, error lines and string widening.
+// Every "%s" conversion of a format passed here takes a wide string.
+#pragma once
+
+#include <cstdarg>
+#include <cstddef>
+#include <cstdint>
+
+#include "dbglevel.h"
+
+// Size, terminator included, of every wide buffer of the trace writer.
+constexpr size_t WIDE_BUFFER_CHARS = 1024;
+
+constexpr const char* HWINFO_LOG_PATH = "../log/velhslot.slotmgr.hwinfo.log";
+constexpr const char* DEBUG_LEVEL_FILE = "dbgprint";
+
+extern int32_t EnterExitIndent;
+// Shared scratch buffer for widening one narrow argument of a trace or error call.
+extern wchar_t WideBuffer[WIDE_BUFFER_CHARS];
+
+void GetDebugPrintLevel(int showHelp);
+void ResetDebugOut();
+
+void dbgprint(const char* format, ...);
+void dbg(const char* function, const char* format, ...);
+void Enter(int32_t* indent, const char* format, ...);
+void Exit(int32_t* indent, const char* format, ...);
+void DebugPrint(const wchar_t* format, ...);
+
+void ErrMsg(const char* function, const char* format, ...);
+int32_t LastErr(const int32_t* error, const char* function, const char* format, ...);
+int32_t LastErrorMsg(const char* text, const int32_t* error);
+
+wchar_t* MakeWideString(const char* source, wchar_t* target);
+wchar_t* MakeWideStringI(const char* source, wchar_t* target, int indent);
+wchar_t* MakeWideStringN(const char* source, wchar_t* target, int count);
+int varargs(wchar_t* out, unsigned int size, wchar_t* format, va_list arguments);
+int HexToAscii(uint32_t value, char* out, int digits);
