@@ -31,8 +31,15 @@ void ErrMsg(const char* function, const char* format, ...);
 int32_t LastErr(const int32_t* error, const char* function, const char* format, ...);
 int32_t LastErrorMsg(const char* text, const int32_t* error);
 
+// Each widens into a target of WIDE_BUFFER_CHARS characters and returns it; a longer text is
+// cut to WIDE_BUFFER_CHARS - 1 characters after a warning line in the log.
 wchar_t* MakeWideString(const char* source, wchar_t* target);
 wchar_t* MakeWideStringI(const char* source, wchar_t* target, int indent);
 wchar_t* MakeWideStringN(const char* source, wchar_t* target, int count);
+// Widens count bytes, each to the character of the same code (0x80 to 0xFF included); writes no
+// terminator.
+void WidenBytes(const char* source, size_t count, wchar_t* target);
+// Formats into out (size characters) after turning every "%s" of format into "%S"; the text
+// is terminated and cut to fit even when the result is negative.
 int varargs(wchar_t* out, unsigned int size, wchar_t* format, va_list arguments);
 int HexToAscii(uint32_t value, char* out, int digits);

@@ -104,7 +104,7 @@ struct ObjListEntry {
 // the front; an enumeration may delete the object it has just been handed and go on.
 template <typename T>
 class ObjListTemp {
-public:
+  public:
     ObjListTemp() = default;
     ObjListTemp(const ObjListTemp&) = delete;
     ObjListTemp& operator=(const ObjListTemp&) = delete;
@@ -117,14 +117,20 @@ public:
     }
 
     int Add(T* object) {
+        Insert(object);
+        return 0;
+    }
+
+    // Add that tells whether the entry could be allocated, so a caller can keep ownership.
+    bool Insert(T* object) {
         auto* entry = new (std::nothrow) ObjListEntry;
         if (entry == nullptr) {
-            return 0;
+            return false;
         }
         entry->Object = object;
         entry->Next = Head;
         Head = entry;
-        return 0;
+        return true;
     }
 
     void Delete(T* object) {
@@ -165,10 +171,19 @@ public:
         }
     }
 
-private:
+  private:
     ObjListEntry* Head = nullptr;
     ObjListEntry** Cursor = &Head;
 };
+
+// Hands a new object to a list; the object is destroyed when the list has no room for it.
+template <typename T>
+T* AddOwned(ObjListTemp<T>& list, std::unique_ptr<T> object) {
+    if (object == nullptr || !list.Insert(object.get())) {
+        return nullptr;
+    }
+    return object.release();
+}
 
 extern ObjListTemp<SystemDescriptor> SystemList;
 extern ObjListTemp<BusDescriptor> BusList;

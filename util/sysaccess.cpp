@@ -29,15 +29,21 @@ int RealQueryModule(const char* name, int which, void* buffer, size_t size, size
 #endif
 }
 
-int RealUname(struct utsname* name) { return uname(name); }
+int RealUname(struct utsname* name) {
+    return uname(name);
+}
 
 SystemPaths Paths;
 KernelCalls Calls{RealIoctl, RealQueryModule, RealUname};
 
 }  // namespace
 
-SystemPaths& SysPaths() { return Paths; }
-KernelCalls& SysCalls() { return Calls; }
+SystemPaths& SysPaths() {
+    return Paths;
+}
+KernelCalls& SysCalls() {
+    return Calls;
+}
 
 void ResetSystemAccess() {
     Paths = SystemPaths{};

@@ -1,5 +1,7 @@
 package com.korvane.sysmgt.tarnova.agent;
 
+import com.korvane.sysmgt.tarnova.agent.cli.CommandLine;
+
 /** The hot-plug PCI slot management agent: the Java half of libvelhlib. */
 public class TarnovaAgent {
     static {
@@ -21,11 +23,8 @@ public class TarnovaAgent {
     public native String[] getAdapterPCIIDInv();
     public native String[] getAdapterDriverInv();
 
+    /** Prints the inventory (a report, or JSON with --json), or blinks a slot's LED. */
     public static void main(String[] args) {
-        TarnovaAgent agent = new TarnovaAgent();
-        agent.getDebugFileReady();
-        agent.getHwInfoReady();
-        System.out.println(agent.getAgentVersionInv());
-        agent.getReadyToExit();
+        System.exit(CommandLine.run(args, TarnovaAgent::new, System.out, System.err));
     }
 }

@@ -1,0 +1,62 @@
+#include "agent/launch.h"
+
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <csignal>
+
+namespace {
+
+// Exit status of the intermediate child when it could not create the program's process.
+constexpr int NO_PROCESS = 1;
+
+// A second fork in the child of a multithreaded process: _Fork runs no fork handlers and is
+// async-signal-safe where the C library has it.
+pid_t ForkInChild() {
+#if defined(__GLIBC__) && (__GLIBC__ > 2 || (__GLIBC__ == 2 && __GLIBC_MINOR__ >= 34))
+    return _Fork();
+#else
+    return fork();
+#endif
+}
+
+}  // namespace
+
+bool LaunchDetached(const char* program, const char* argument) {
+    // Everything the children need is prepared here: after fork only async-signal-safe calls
+    // are allowed, since the JVM's other threads (and their locks) did not come along.
+    sigset_t unblocked;
+    sigemptyset(&unblocked);
+
+    // The program runs as a grandchild whose parent exits at once, so the program is adopted
+    // and reaped by init; the only child of ours is waited for right away and that wait is
+    // short. No SIGCHLD handler of the JVM is touched.
+    pid_t child = fork();
+    if (child < 0) {
+        return false;
+    }
+    if (child == 0) {
+        pid_t grandchild = ForkInChild();
+        if (grandchild < 0) {
+            _exit(NO_PROCESS);
+        }
+        if (grandchild > 0) {
+            _exit(0);
+        }
+        // The calling Java thread may block signals that the program must receive
+        // (killall's SIGTERM); a blocked mask would survive the exec.
+        sigprocmask(SIG_SETMASK, &unblocked, nullptr);
+        execlp(program, program, argument, static_cast<char*>(nullptr));
+        _exit(0);
+    }
+
+    int status = 0;
+    while (waitpid(child, &status, 0) < 0) {
+        if (errno != EINTR) {
+            // Reaped elsewhere (SIGCHLD ignored): the outcome cannot be known.
+            return true;
+        }
+    }
+    return !(WIFEXITED(status) && WEXITSTATUS(status) == NO_PROCESS);
+}

@@ -1,0 +1,103 @@
+package com.korvane.sysmgt.tarnova.agent.cli;
+
+import com.korvane.sysmgt.tarnova.agent.TarnovaAgent;
+import java.io.PrintStream;
+import java.util.function.Function;
+import java.util.function.Supplier;
+
+/** The agent's command line: report (default), --json, or --blink SLOT STATE. */
+public final class CommandLine {
+    public static final int EXIT_OK = 0;
+    public static final int EXIT_FAILED = 1;
+    public static final int EXIT_USAGE = 2;
+
+    static final String USAGE = String.join("\n",
+        "usage: TarnovaAgent [--json | --blink SLOT STATE]",
+        "  (no option)         collect the slot hardware and print a readable report",
+        "  --json              collect the slot hardware and print one JSON document",
+        "  --blink SLOT STATE  set the blink state of a slot's attention LED (no collection)",
+        "");
+
+    private enum Mode { REPORT, JSON, BLINK, HELP }
+
+    private final Mode mode;
+    private final long slot;
+    private final int state;
+
+    private CommandLine(Mode mode, long slot, int state) {
+        this.mode = mode;
+        this.slot = slot;
+        this.state = state;
+    }
+
+    /** @throws IllegalArgumentException with the reason when the arguments are not usable */
+    static CommandLine parse(String[] args) {
+        if (args.length == 0) {
+            return new CommandLine(Mode.REPORT, 0, 0);
+        }
+        switch (args[0]) {
+            case "--json":
+                expectCount(args, 1);
+                return new CommandLine(Mode.JSON, 0, 0);
+            case "--blink":
+                expectCount(args, 3);
+                return new CommandLine(Mode.BLINK,
+                    number(args[1], "SLOT is not a 64-bit decimal integer", Long::parseLong),
+                    number(args[2], "STATE is not a 32-bit decimal integer", Integer::parseInt));
+            case "--help":
+            case "-h":
+                expectCount(args, 1);
+                return new CommandLine(Mode.HELP, 0, 0);
+            default:
+                throw new IllegalArgumentException("unknown option: " + args[0]);
+        }
+    }
+
+    private static void expectCount(String[] args, int count) {
+        if (args.length != count) {
+            throw new IllegalArgumentException(args[0] + " takes "
+                + (count == 1 ? "no argument" : (count - 1) + " arguments"));
+        }
+    }
+
+    private static <T> T number(String text, String complaint, Function<String, T> parser) {
+        try {
+            return parser.apply(text);
+        } catch (NumberFormatException e) {
+            throw new IllegalArgumentException(complaint + ": " + text);
+        }
+    }
+
+    /** Runs the command line against the agent that supplier creates; returns the exit code. */
+    public static int run(String[] args, Supplier<TarnovaAgent> agents, PrintStream out,
+                          PrintStream err) {
+        CommandLine command;
+        try {
+            command = parse(args);
+        } catch (IllegalArgumentException e) {
+            err.println("TarnovaAgent: " + e.getMessage());
+            err.print(USAGE);
+            return EXIT_USAGE;
+        }
+        switch (command.mode) {
+            case HELP:
+                out.print(USAGE);
+                return EXIT_OK;
+            case BLINK:
+                agents.get().BlinkCmd(command.slot, command.state);
+                return EXIT_OK;
+            default:
+                Inventory inventory;
+                try {
+                    inventory = Inventory.collect(agents.get());
+                } catch (IllegalArgumentException e) {
+                    err.println("TarnovaAgent: unusable inventory: " + e.getMessage());
+                    return EXIT_FAILED;
+                }
+                out.print(command.mode == Mode.JSON ? JsonWriter.write(inventory)
+                                                    : ReportFormatter.format(inventory));
+                out.flush();
+                return out.checkError() ? EXIT_FAILED : EXIT_OK;
+        }
+    }
+}

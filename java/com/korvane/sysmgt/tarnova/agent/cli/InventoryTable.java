@@ -1,0 +1,83 @@
+package com.korvane.sysmgt.tarnova.agent.cli;
+
+import java.util.LinkedHashMap;
+import java.util.List;
+import java.util.Map;
+
+/**
+ * One kind of object as the agent reports it: a numeric element per object (values in the
+ * order of the field names) and, for some kinds, text columns whose element i belongs to
+ * object i.
+ */
+public final class InventoryTable {
+    /** The value of a 32-bit field that means none or unknown, as Java receives it. */
+    public static final long NONE = 4294967295L;
+
+    public static final List<String> SYSTEM_FIELDS = List.of(
+        "SystemID", "StringID", "ChassisNum", "DrawerNum", "FirstSlotNum", "UnitSlotCount");
+    public static final List<String> BUS_FIELDS = List.of("BusID", "BusNum", "ChassisNum",
+        "DrawerNum", "LoadAt33", "LoadAt66", "LoadAtX66", "LoadAtX100", "LoadAtX133",
+        "CurBusSpeed", "InPciXMode", "SupHotPlug");
+    public static final List<String> SLOT_FIELDS = List.of("SlotID", "BusID", "ChassisNum",
+        "DrawerNum", "DevNum", "FriendlyNum", "Width", "AttnReason", "Status", "Sup5V", "SupPME",
+        "SupSMBUS", "SupHotPlug", "PciX", "SpeedBits", "AttnLedBlinking", "HalfLength",
+        "LowProfile");
+    public static final List<String> ADAPTER_FIELDS = List.of("AdapterID", "SlotID",
+        "MaxSpeed", "PowerReq", "Width", "HasBridge", "IsBootDev", "SupPciX", "OnBoard", "BusID",
+        "Device", "Function");
+
+    private final String title;
+    private final List<String> fields;
+    private final long[][] rows;
+    private final Map<String, String[]> texts = new LinkedHashMap<>();
+
+    /**
+     * @param rows a numeric inventory; null (the library could not build it) counts as empty
+     * @throws IllegalArgumentException if an element does not hold one value per field
+     */
+    public InventoryTable(String title, List<String> fields, long[][] rows) {
+        this.title = title;
+        this.fields = fields;
+        this.rows = rows == null ? new long[0][] : rows.clone();
+        for (int i = 0; i < this.rows.length; i++) {
+            if (this.rows[i] == null || this.rows[i].length != fields.size()) {
+                throw new IllegalArgumentException(String.format(
+                    "%s element %d has %s values, expected %d", title, i,
+                    this.rows[i] == null ? "no" : String.valueOf(this.rows[i].length),
+                    fields.size()));
+            }
+        }
+    }
+
+    /** Adds a text column from a string inventory (null counts as empty); returns this table. */
+    public InventoryTable withText(String column, String[] values) {
+        texts.put(column, values == null ? new String[0] : values.clone());
+        return this;
+    }
+
+    public String title() {
+        return title;
+    }
+
+    public List<String> fields() {
+        return fields;
+    }
+
+    public List<String> textColumns() {
+        return List.copyOf(texts.keySet());
+    }
+
+    public int size() {
+        return rows.length;
+    }
+
+    public long value(int row, int field) {
+        return rows[row][field];
+    }
+
+    /** The text of a column for one object; null when the string inventory has no element. */
+    public String text(int row, String column) {
+        String[] values = texts.get(column);
+        return values != null && row < values.length ? values[row] : null;
+    }
+}

@@ -1,0 +1,106 @@
+// The sample machine that the README's run command uses: every part of it is there and agrees.
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <set>
+#include <string>
+
+#include "sim/common/textfile.h"
+#include "sim/tests/simrun.h"
+
+namespace velhsim::test {
+namespace {
+
+using ::testing::HasSubstr;
+
+const std::string SAMPLE = VELHSIM_SAMPLE_MACHINE;
+
+// Whether a PCI ID database holds the device line within its vendor's block.
+bool KnowsDevice(const std::string& ids, const std::string& vendor, const std::string& device) {
+    const size_t block = ids.find("\n" + vendor + "  ");
+    if (block == std::string::npos) {
+        return false;
+    }
+    // The block ends at the next line that is not indented.
+    size_t end = block + 1;
+    while ((end = ids.find('\n', end)) != std::string::npos && end + 1 < ids.size() &&
+           ids[end + 1] == '\t') {
+        ++end;
+    }
+    const size_t line = ids.find("\n\t" + device + "  ", block);
+    return line != std::string::npos && line < end;
+}
+
+TEST(SampleMachine, OffersEveryPartOfTheDescribedServer) {
+    const ScratchDir dir;
+    const std::string run = dir / "run";
+    const RunResult result = RunScript(SAMPLE, run,
+                                       "$PROBE version\n"
+                                       "$PROBE qm velhpdrv 5 64\n"
+                                       "$PROBE uname\n"
+                                       "head -1 /etc/SuSE-release\n"
+                                       "grep ^INITRD_MODULES /etc/sysconfig/kernel\n"
+                                       "echo $(ls /proc/bus/pci)\n"
+                                       "wc -l < /proc/bus/pci/devices\n"
+                                       "od -An -c -j $((0xF5A40 + 40)) -N 7 /dev/mem\n"
+                                       "ls\n");
+    ASSERT_EQ(result.Status, 0) << result.Err;
+    EXPECT_EQ(result.Out,
+              "version 1.0.0\n"
+              "ret " +
+                  std::to_string(4 * sizeof(unsigned long)) +
+                  "\n"
+                  "info d0800000 5000 1 0\n"
+                  "release 2.4.19-64GB-SMP\n"
+                  "SuSE SLES-8 (i386)\n"
+                  "INITRD_MODULES=\"ips aic7xxx reiserfs\"\n"
+                  "00 01 02 03 04 05 10 11 devices\n"
+                  "24\n"
+                  "   8   8   7   0   4   R   X\n"
+                  "dbgprint\nvelhadp.crd\n");
+}
+
+TEST(SampleMachine, HandsOutTheTableCompiledFromItsArchitectureFile) {
+    const ScratchDir dir;
+    const std::string run = dir / "run";
+    const RunResult result = RunScript(SAMPLE, run, "$PROBE table");
+    ASSERT_EQ(result.Status, 0) << result.Err;
+    // The driver hands out the table that the library's reader makes of driver/asl.pci.
+    const RunResult compiled = RunProgram({PCI2ASL, SAMPLE + "/driver/asl.pci", dir / "asl.bin"});
+    ASSERT_EQ(compiled.Status, 0) << compiled.Err;
+    const std::string table = FileText(dir / "asl.bin");
+    ASSERT_GT(table.size(), 16u);
+    EXPECT_EQ(table.substr(0, 4), "VHSL");
+    EXPECT_EQ(FileText(run + "/driver/asl.bin"), table);
+    const std::string size = std::to_string(table.size());
+    EXPECT_EQ(result.Out, "size " + size + "\ntable " + size + " " + Hex(table) + " next ee\n");
+}
+
+TEST(SampleMachine, HasAModuleForEveryBoundDriverAndNamesItsDevices) {
+    const std::string devices = [] {
+        const ScratchDir dir;
+        return RunScript(SAMPLE, dir / "run", "cat /proc/bus/pci/devices").Out;
+    }();
+    const std::string ids = FileText(SAMPLE + "/usr/share/pci.ids");
+    std::set<std::string> drivers;
+    for (std::string_view line : SplitLines(devices)) {
+        const std::string text(line);
+        const std::string driver = text.substr(text.rfind('\t') + 1);
+        if (!driver.empty()) {
+            drivers.insert(driver);
+        }
+        // Every vendor and device is in the machine's PCI ID database.
+        EXPECT_TRUE(KnowsDevice(ids, text.substr(5, 4), text.substr(9, 4))) << text;
+    }
+    EXPECT_EQ(drivers.size(), 9u);
+    const std::string modules = SAMPLE + "/modules";
+    for (const std::string& driver : drivers) {
+        EXPECT_TRUE(IsRegularFile(JoinPath(JoinPath(modules, driver), "flags"))) << driver;
+    }
+    EXPECT_THAT(FileText(SAMPLE + "/modules/e1000/symbols"),
+                HasSubstr("__insmod_e1000_O/lib/modules/2.4.19-64GB-SMP/kernel/drivers/net/"
+                          "e1000/e1000.o_M"));
+}
+
+}  // namespace
+}  // namespace velhsim::test

@@ -1,0 +1,122 @@
+// Builds ASL packets for tests from readable calls:
+//   AslBuilder().Header().Chassis(0, 1).String(1, "Main").Bus({...}).Slot({...}).End()
+#pragma once
+
+#include <algorithm>
+#include <cstdint>
+#include <cstring>
+#include <initializer_list>
+#include <memory>
+#include <string>
+#include <vector>
+
+#include "asl.h"
+
+struct AslBusSpec {
+    uint8_t BusID = 0;
+    uint8_t ChassisID = 0;
+    uint8_t DrawerID = 255;
+    uint8_t BusNumber = 0;
+    uint8_t Speed = 0;
+    uint8_t At33 = 0;
+    uint8_t At66 = 0;
+    uint8_t AtX66 = 0;
+    uint8_t AtX100 = 0;
+    uint8_t AtX133 = 0;
+};
+
+struct AslSlotSpec {
+    uint16_t SlotID = 0;
+    uint8_t BusID = 0;
+    uint8_t DeviceNum = 0;
+    uint8_t Sun = 255;
+    uint8_t Attrib1 = 0;
+    uint8_t Attrib2 = 0;
+    uint8_t AttnReason = 0;
+    uint8_t Status = 0;
+    uint8_t LedStatus = 0;
+    uint8_t SlotUiNumber = 0;
+};
+
+class AslBuilder {
+  public:
+    AslBuilder& Header(const char* machine = "TST001") {
+        Bytes.insert(Bytes.end(), {'V', 'H', 'S', 'L', 16, 1, 0});
+        for (int i = 0; i < 6; ++i) {
+            Bytes.push_back(static_cast<uint8_t>(machine[i]));
+        }
+        Bytes.insert(Bytes.end(), {0, 0, 0});
+        return *this;
+    }
+
+    AslBuilder& Bus(const AslBusSpec& b) {
+        return Fixed({BUS_TYPE, 16, b.BusID, b.ChassisID, b.DrawerID, b.BusNumber, 0, 0, b.Speed,
+                      b.At33, b.At66, b.AtX66, b.AtX100, b.AtX133});
+    }
+
+    AslBuilder& Slot(const AslSlotSpec& s) {
+        return Fixed({SLOT_TYPE, 16, static_cast<uint8_t>(s.SlotID & 0xFF),
+                      static_cast<uint8_t>(s.SlotID >> 8), s.BusID, s.DeviceNum, s.Sun, s.Attrib1,
+                      s.Attrib2, s.AttnReason, s.Status, s.LedStatus, s.SlotUiNumber});
+    }
+
+    AslBuilder& Chassis(uint8_t chassisId, uint8_t stringId) {
+        return Fixed({CHASSIS_TYPE, 16, chassisId, 0, stringId});
+    }
+
+    AslBuilder& Drawer(uint8_t drawerId, uint8_t stringId) {
+        return Fixed({DRAWER_TYPE, 16, drawerId, 0, stringId});
+    }
+
+    AslBuilder& String(uint8_t number, const std::string& text) {
+        Last = Bytes.size();
+        Bytes.push_back(STRING_TYPE);
+        Bytes.push_back(number);
+        Bytes.insert(Bytes.end(), text.begin(), text.end());
+        Bytes.push_back(0);
+        return *this;
+    }
+
+    AslBuilder& End() { return Raw({END_TYPE}); }
+
+    AslBuilder& Raw(std::initializer_list<uint8_t> bytes) {
+        Last = Bytes.size();
+        Bytes.insert(Bytes.end(), bytes);
+        return *this;
+    }
+
+    // Clears bit 7 of the last descriptor's type byte: walked over, not stored.
+    AslBuilder& Invalid() {
+        Bytes[Last] &= 0x7F;
+        return *this;
+    }
+
+    // Sets the Length byte of the last fixed descriptor.
+    AslBuilder& Length(uint8_t length) {
+        Bytes[Last + 1] = length;
+        return *this;
+    }
+
+    size_t Size() const { return Bytes.size(); }
+
+    // The packet in a zero-filled buffer of the full capacity, as the acquisition holds it.
+    std::unique_ptr<_ASL_PACKET> Packet() const {
+        auto packet = std::make_unique<_ASL_PACKET>();
+        std::memset(packet.get(), 0, sizeof(_ASL_PACKET));
+        std::memcpy(packet.get(), Bytes.data(), std::min(Bytes.size(), sizeof(_ASL_PACKET)));
+        return packet;
+    }
+
+    std::vector<uint8_t> Bytes;
+
+  private:
+    AslBuilder& Fixed(std::initializer_list<uint8_t> fields) {
+        Last = Bytes.size();
+        std::vector<uint8_t> descriptor(fields);
+        descriptor.resize(16, 0);
+        Bytes.insert(Bytes.end(), descriptor.begin(), descriptor.end());
+        return *this;
+    }
+
+    size_t Last = 0;
+};

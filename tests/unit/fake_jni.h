@@ -1,0 +1,77 @@
+// A JNI environment without a JVM for the inventory builders: the few functions they use,
+// objects kept in plain C++ records, chosen calls made to fail the way a JVM fails them (null
+// and a pending exception), and the rule checks a JVM enforces with -Xcheck:jni.
+#pragma once
+
+#include <jni.h>
+
+#include <memory>
+#include <string>
+#include <vector>
+
+struct FakeObject {
+    enum class Kind { Class, LongArray, ObjectArray, String };
+    Kind kind = Kind::Class;
+    std::string className;
+    std::vector<jlong> longs;
+    std::vector<FakeObject*> elements;
+    std::u16string text;
+};
+
+class FakeJni {
+  public:
+    FakeJni();
+    ~FakeJni();
+    FakeJni(const FakeJni&) = delete;
+    FakeJni& operator=(const FakeJni&) = delete;
+
+    JNIEnv* Env() { return &env; }
+    static FakeObject* Object(jobject reference) {
+        return reinterpret_cast<FakeObject*>(reference);
+    }
+
+    // The nth call (counting from 1) of a function fails; 0: none does.
+    int FailNewLongArray = 0;
+    int FailNewObjectArray = 0;
+    int FailNewString = 0;
+    int FailNewStringUTF = 0;
+    int FailFindClass = 0;
+
+    bool ExceptionPending = false;
+    // Calls other than DeleteLocalRef made while an exception was pending.
+    int CallsWithException = 0;
+    // Element stores outside the array, which a JVM answers with an exception.
+    int OutOfBounds = 0;
+    int LiveLocalRefs = 0;
+    int PeakLocalRefs = 0;
+
+  private:
+    static FakeJni* current;
+    FakeJni* previous;
+    JNINativeInterface_ table{};
+    JNIEnv env{};
+    std::vector<std::unique_ptr<FakeObject>> heap;
+    int newLongArrayCalls = 0;
+    int newObjectArrayCalls = 0;
+    int newStringCalls = 0;
+    int newStringUtfCalls = 0;
+    int findClassCalls = 0;
+
+    static bool Fails(int& calls, int failAt);
+    static void Enter();
+    static jobject NewLocal(std::unique_ptr<FakeObject> object);
+
+    static jclass JNICALL FindClassImpl(JNIEnv*, const char* name);
+    static jclass JNICALL GetObjectClassImpl(JNIEnv*, jobject object);
+    static void JNICALL DeleteLocalRefImpl(JNIEnv*, jobject object);
+    static jboolean JNICALL ExceptionCheckImpl(JNIEnv*);
+    static jlongArray JNICALL NewLongArrayImpl(JNIEnv*, jsize length);
+    static void JNICALL SetLongArrayRegionImpl(JNIEnv*, jlongArray array, jsize start, jsize length,
+                                               const jlong* values);
+    static jobjectArray JNICALL NewObjectArrayImpl(JNIEnv*, jsize length, jclass elementClass,
+                                                   jobject initial);
+    static void JNICALL SetObjectArrayElementImpl(JNIEnv*, jobjectArray array, jsize index,
+                                                  jobject value);
+    static jstring JNICALL NewStringImpl(JNIEnv*, const jchar* units, jsize length);
+    static jstring JNICALL NewStringUTFImpl(JNIEnv*, const char* text);
+};

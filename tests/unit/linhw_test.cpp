@@ -1,0 +1,251 @@
+#include "sources/linhw.h"
+
+#include <dirent.h>
+#include <gtest/gtest.h>
+
+#include <cerrno>
+#include <cstring>
+#include <memory>
+#include <string>
+#include <vector>
+
+#include "diag/hwdebug.h"
+#include "scratchdir.h"
+#include "util/sysaccess.h"
+#include "velhpdrv.h"
+
+namespace {
+
+// A slot driver behind the ioctl seam: answers the four requests from its fields and records
+// what it was sent.
+struct FakeDriver {
+    _VELH_VERSION Version{1, 0, 0};
+    uint32_t TableSize = 0;      // answer to the size request
+    uint32_t DeliveredSize = 0;  // size answered after the table request; 0: the buffer's size
+    unsigned long FailRequest = 0;
+    int FailErrno = EIO;
+
+    std::vector<unsigned long> Requests;
+    std::vector<_VELH_TABLE_XFER> Transfers;  // as sent
+    _VELH_BLINK Blink{};
+};
+
+FakeDriver* Driver = nullptr;
+
+uint8_t TableByte(uint32_t offset) {
+    return static_cast<uint8_t>(offset * 7 + 3);
+}
+
+int FakeIoctl(int /*fd*/, unsigned long request, void* argument) {
+    Driver->Requests.push_back(request);
+    if (request == Driver->FailRequest) {
+        errno = Driver->FailErrno;
+        return -1;
+    }
+    if (request == VELH_IOCTL_VERSION) {
+        *static_cast<_VELH_VERSION*>(argument) = Driver->Version;
+    } else if (request == VELH_IOCTL_TABLE_SIZE || request == VELH_IOCTL_TABLE) {
+        auto* transfer = static_cast<_VELH_TABLE_XFER*>(argument);
+        Driver->Transfers.push_back(*transfer);
+        if (request == VELH_IOCTL_TABLE_SIZE) {
+            transfer->Size = Driver->TableSize;
+        } else {
+            // Fills exactly the buffer it was given, then reports its own size.
+            auto* buffer = static_cast<uint8_t*>(transfer->Buffer);
+            for (uint32_t i = 0; i < transfer->Size; ++i) {
+                buffer[i] = TableByte(i);
+            }
+            if (Driver->DeliveredSize != 0) {
+                transfer->Size = Driver->DeliveredSize;
+            }
+        }
+    } else if (request == VELH_IOCTL_BLINK) {
+        Driver->Blink = *static_cast<_VELH_BLINK*>(argument);
+    } else {
+        errno = EINVAL;
+        return -1;
+    }
+    return 0;
+}
+
+size_t OpenDescriptors() {
+    size_t count = 0;
+    DIR* dir = opendir("/proc/self/fd");
+    while (dir != nullptr && readdir(dir) != nullptr) {
+        ++count;
+    }
+    if (dir != nullptr) {
+        closedir(dir);
+    }
+    return count;
+}
+
+class SlotDriverTest : public ::testing::Test {
+  protected:
+    void SetUp() override {
+        Driver = &Fake;
+        SysPaths().SlotDriver = Tree.Scratch().Write("velhpdrv", "");
+        SysCalls().Ioctl = FakeIoctl;
+        Packet = std::make_unique<_ASL_PACKET>();
+        std::memset(Packet.get(), 0xEE, sizeof(_ASL_PACKET));
+        Descriptors = OpenDescriptors();
+    }
+    void TearDown() override {
+        // Every operation closes the device before it returns.
+        EXPECT_EQ(OpenDescriptors(), Descriptors);
+        ResetSystemAccess();
+        HwInfoPrintLevel = 0;
+        Driver = nullptr;
+    }
+
+    // The error block of a failed request or open, ending with the error number and its text.
+    static std::string ErrorBlock(const std::string& function, const std::string& message,
+                                  int error) {
+        char number[16];
+        std::snprintf(number, sizeof(number), "0x%08x", error);
+        return "\nVELHLIB, " + function + ":  " + message + " (" + number +
+               "):  " + std::strerror(error) + "\n\n";
+    }
+
+    bool PacketUntouchedFrom(size_t offset) const {
+        const auto* bytes = reinterpret_cast<const uint8_t*>(Packet.get());
+        for (size_t i = offset; i < sizeof(_ASL_PACKET); ++i) {
+            if (bytes[i] != 0xEE) {
+                return false;
+            }
+        }
+        return true;
+    }
+
+    InstallTree Tree;
+    FakeDriver Fake;
+    std::unique_ptr<_ASL_PACKET> Packet;
+    size_t Descriptors = 0;
+};
+
+}  // namespace
+
+TEST_F(SlotDriverTest, DriverVersionText) {
+    Fake.Version = {1, 2, 3};
+    char* first = GetDriverVersion();
+    ASSERT_NE(first, nullptr);
+    EXPECT_STREQ(first, "1.2.3");
+    EXPECT_EQ(Fake.Requests, (std::vector<unsigned long>{VELH_IOCTL_VERSION}));
+
+    Fake.Version = {10, 0, 7};
+    char* second = GetDriverVersion();
+    EXPECT_EQ(second, first);
+    EXPECT_STREQ(second, "10.0.7");
+
+    // Three numbers of eleven characters each are cut to the buffer's 31.
+    Fake.Version = {INT32_MIN, INT32_MIN, INT32_MIN};
+    EXPECT_STREQ(GetDriverVersion(), "-2147483648.-2147483648.-214748");
+    EXPECT_EQ(Tree.Log(), "");
+
+    Fake.FailRequest = VELH_IOCTL_VERSION;
+    EXPECT_EQ(GetDriverVersion(), nullptr);
+    EXPECT_EQ(Tree.Log(), ErrorBlock("GetDriverVersion()", "Driver version IOCTL failed", EIO));
+}
+
+TEST_F(SlotDriverTest, ReadsTheTableInTwoSteps) {
+    HwInfoPrintLevel = RAW_ASL;
+    Fake.TableSize = 1234;
+    EXPECT_EQ(GetAslTable(Packet.get()), 1234u);
+    const auto* bytes = reinterpret_cast<const uint8_t*>(Packet.get());
+    for (uint32_t i = 0; i < 1234; ++i) {
+        ASSERT_EQ(bytes[i], TableByte(i)) << i;
+    }
+    EXPECT_TRUE(PacketUntouchedFrom(1234));
+
+    ASSERT_EQ(Fake.Requests, (std::vector<unsigned long>{VELH_IOCTL_TABLE_SIZE, VELH_IOCTL_TABLE}));
+    EXPECT_EQ(Fake.Transfers[0].Buffer, nullptr);
+    EXPECT_EQ(Fake.Transfers[0].Size, 0u);
+    EXPECT_NE(Fake.Transfers[1].Buffer, nullptr);
+    EXPECT_EQ(Fake.Transfers[1].Size, 1234u);
+    EXPECT_EQ(Tree.Log(),
+              "\nvelhlib, GetAslTable():  Calling VelhSlot driver\n\n"
+              "\nGetAslTable(), buffer size: 80016\n"
+              "GetAslTable(), got 1234 bytes from driver\n\n");
+}
+
+TEST_F(SlotDriverTest, TableSizesOutsideTheBuffer) {
+    // A table larger than the packet buffer is refused before it is asked for.
+    Fake.TableSize = ASL_PACKET_CAPACITY + 1;
+    EXPECT_EQ(GetAslTable(Packet.get()), 0u);
+    EXPECT_EQ(Fake.Requests, (std::vector<unsigned long>{VELH_IOCTL_TABLE_SIZE}));
+    EXPECT_EQ(Tree.Log(),
+              "\nVELHLIB, GetAslTable():  Table of 80017 bytes does not fit the 80016-byte "
+              "buffer\n");
+    EXPECT_TRUE(PacketUntouchedFrom(0));
+
+    // A table of the full capacity fits.
+    Fake.Requests.clear();
+    Fake.TableSize = ASL_PACKET_CAPACITY;
+    EXPECT_EQ(GetAslTable(Packet.get()), ASL_PACKET_CAPACITY);
+
+    // Size 0 is no table.
+    Fake.Requests.clear();
+    Fake.TableSize = 0;
+    EXPECT_EQ(GetAslTable(Packet.get()), 0u);
+    EXPECT_EQ(Fake.Requests, (std::vector<unsigned long>{VELH_IOCTL_TABLE_SIZE}));
+}
+
+TEST_F(SlotDriverTest, DriverRaisingTheSizeCannotOverrun) {
+    Fake.TableSize = 100;
+    Fake.DeliveredSize = 5000;
+    EXPECT_EQ(GetAslTable(Packet.get()), 100u);
+    EXPECT_EQ(reinterpret_cast<const uint8_t*>(Packet.get())[99], TableByte(99));
+    EXPECT_TRUE(PacketUntouchedFrom(100));
+    EXPECT_EQ(Tree.Log(),
+              "\nVELHLIB, GetAslTable():  Driver delivered 5000 bytes into a buffer of 100; the "
+              "table is cut\n");
+
+    // A driver answering less the second time hands over only that much.
+    Fake.DeliveredSize = 60;
+    std::memset(Packet.get(), 0xEE, sizeof(_ASL_PACKET));
+    EXPECT_EQ(GetAslTable(Packet.get()), 60u);
+    EXPECT_TRUE(PacketUntouchedFrom(60));
+}
+
+TEST_F(SlotDriverTest, FailedTableRequests) {
+    Fake.TableSize = 64;
+    Fake.FailRequest = VELH_IOCTL_TABLE_SIZE;
+    EXPECT_EQ(GetAslTable(Packet.get()), 0u);
+    EXPECT_EQ(Tree.Log(), ErrorBlock("GetAslTable()", "Read table size IOCTL failed", EIO));
+
+    Fake.FailRequest = VELH_IOCTL_TABLE;
+    Fake.FailErrno = EFAULT;
+    EXPECT_EQ(GetAslTable(Packet.get()), 0u);
+    EXPECT_EQ(Tree.Log(), ErrorBlock("GetAslTable()", "Read table size IOCTL failed", EIO) +
+                              ErrorBlock("GetAslTable()", "Read table IOCTL failed", EFAULT));
+    EXPECT_TRUE(PacketUntouchedFrom(0));
+}
+
+TEST_F(SlotDriverTest, MissingDeviceFailsEveryOperation) {
+    SysPaths().SlotDriver = Tree.Scratch().Path("no-such-device");
+    EXPECT_EQ(GetDriverVersion(), nullptr);
+    EXPECT_EQ(GetAslTable(Packet.get()), 0u);
+    EXPECT_FALSE(HwSetBlinkState(1, 1));
+    EXPECT_TRUE(Fake.Requests.empty());
+    const std::string open = "Open \"" + SysPaths().SlotDriver + "\" failed";
+    EXPECT_EQ(Tree.Log(), ErrorBlock("GetDriverVersion()", open, ENOENT) +
+                              ErrorBlock("GetAslTable()", open, ENOENT) +
+                              ErrorBlock("HwSetBlinkState()", open, ENOENT));
+}
+
+TEST_F(SlotDriverTest, BlinkRequest) {
+    EXPECT_TRUE(HwSetBlinkState(7, 0xFFFFFFFFu));
+    EXPECT_EQ(Fake.Requests, (std::vector<unsigned long>{VELH_IOCTL_BLINK}));
+    EXPECT_EQ(Fake.Blink.Slot, 7u);
+    EXPECT_EQ(Fake.Blink.State, 0xFFFFFFFFu);
+    EXPECT_EQ(Tree.Log(), "");
+
+    Fake.FailRequest = VELH_IOCTL_BLINK;
+    Fake.FailErrno = EBUSY;
+    EXPECT_FALSE(HwSetBlinkState(3, 1));
+    char number[16];
+    std::snprintf(number, sizeof(number), "0x%08x", EBUSY);
+    EXPECT_EQ(Tree.Log(),
+              std::string("velhlib, HwSetBlinkState():  VelhSlot driver call failed (") + number +
+                  "):  " + std::strerror(EBUSY) + "\n");
+}

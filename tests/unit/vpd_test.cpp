@@ -1,0 +1,118 @@
+#include <gtest/gtest.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <cstring>
+#include <string>
+
+#include "adapters/linvpd.h"
+#include "scratchdir.h"
+#include "util/sysaccess.h"
+
+namespace {
+
+_VPD_LAYOUT Record(const char* typeModel) {
+    _VPD_LAYOUT record;
+    std::memset(&record, 0x20, sizeof(record));
+    record.Header1 = 0xAA;
+    record.Header2 = 0x55;
+    std::memcpy(record.Signature, "VPD", 3);
+    record.VpdLength = 48;
+    std::memcpy(record.MachineTypeModel, typeModel, 7);
+    record.Checksum = 0x5A;
+    return record;
+}
+
+class VpdTest : public ::testing::Test {
+  protected:
+    void SetUp() override {
+        ValidVPD = false;
+        std::memset(&Vpd, 0, sizeof(Vpd));
+        Image = Tree.Scratch().Path("mem");
+        SysPaths().DevMem = Image;
+        // A sparse memory image that ends with the BIOS segment.
+        FILE* image = std::fopen(Image.c_str(), "wb");
+        ASSERT_NE(image, nullptr);
+        ASSERT_EQ(ftruncate(fileno(image), VPD_SEGMENT_OFFSET + VPD_SEGMENT_SIZE), 0);
+        std::fclose(image);
+    }
+    void TearDown() override {
+        ResetSystemAccess();
+        ValidVPD = false;
+        std::memset(&Vpd, 0, sizeof(Vpd));
+    }
+    // Writes bytes at an offset within the segment, cut at the image's end.
+    void Put(uint32_t offset, const void* bytes, size_t length) {
+        FILE* image = std::fopen(Image.c_str(), "r+b");
+        ASSERT_NE(image, nullptr);
+        length = std::min<size_t>(length, VPD_SEGMENT_SIZE - offset);
+        ASSERT_EQ(std::fseek(image, VPD_SEGMENT_OFFSET + offset, SEEK_SET), 0);
+        ASSERT_EQ(std::fwrite(bytes, 1, length, image), length);
+        std::fclose(image);
+    }
+    void Put(uint32_t offset, const _VPD_LAYOUT& record) { Put(offset, &record, sizeof(record)); }
+
+    InstallTree Tree;
+    std::string Image;
+};
+
+TEST_F(VpdTest, TakesTheRecordAtTheLowestOffset) {
+    const _VPD_LAYOUT low = Record("8870AAA");
+    Put(0x1234, low);
+    Put(0x8000, Record("8870BBB"));
+    // Header bytes followed by another signature are no record.
+    Put(0x0100, "\xAA\x55VPX", 5);
+    Put(0x0200, "\xAA\x54VPD", 5);
+    _VPD_LAYOUT out;
+    ASSERT_TRUE(GetVPD(&out));
+    EXPECT_TRUE(ValidVPD);
+    EXPECT_EQ(std::memcmp(&out, &low, sizeof(out)), 0);
+    EXPECT_EQ(Tree.Log(), "");
+}
+
+TEST_F(VpdTest, ARecordMustFitWhollyInTheSegment) {
+    _VPD_LAYOUT out;
+    std::memset(&out, 0x11, sizeof(out));
+    const _VPD_LAYOUT last = Record("1234XYZ");
+    Put(VPD_SEGMENT_SIZE - sizeof(_VPD_LAYOUT) + 1, last);  // its last byte would lie outside
+    EXPECT_FALSE(GetVPD(&out));
+    EXPECT_FALSE(ValidVPD);
+    EXPECT_EQ(out.Header1, 0x11);  // untouched
+
+    Put(VPD_SEGMENT_SIZE - sizeof(_VPD_LAYOUT), last);  // exactly the last place that fits
+    ASSERT_TRUE(GetVPD(&out));
+    EXPECT_EQ(std::memcmp(&out, &last, sizeof(out)), 0);
+}
+
+TEST_F(VpdTest, NoRecordLeavesEverythingAsItWasAndIsSearchedAgain) {
+    EXPECT_FALSE(GetVPD(&Vpd));
+    EXPECT_FALSE(ValidVPD);
+    EXPECT_EQ(Tree.Log(), "");  // no message for a missing record
+
+    const _VPD_LAYOUT record = Record("7890ABC");
+    Put(0x40, record);
+    ASSERT_TRUE(GetVPD(&Vpd));
+    EXPECT_EQ(std::memcmp(&Vpd, &record, sizeof(Vpd)), 0);
+
+    // Once found the record stays, even when a later search fails.
+    SysPaths().DevMem = Tree.Scratch().Path("missing");
+    EXPECT_FALSE(GetVPD(&Vpd));
+    EXPECT_TRUE(ValidVPD);
+    EXPECT_EQ(std::memcmp(&Vpd, &record, sizeof(Vpd)), 0);
+    EXPECT_NE(
+        Tree.Log().find("GetVPD():  error opening memory file " + Tree.Scratch().Path("missing")),
+        std::string::npos)
+        << Tree.Log();
+}
+
+TEST_F(VpdTest, AShortImageIsAReadFailure) {
+    ASSERT_EQ(truncate(Image.c_str(), VPD_SEGMENT_OFFSET + 100), 0);
+    Put(0, Record("1111222"));
+    _VPD_LAYOUT out;
+    EXPECT_FALSE(GetVPD(&out));
+    EXPECT_FALSE(ValidVPD);
+    EXPECT_NE(Tree.Log().find("GetVPD():  read failed, got 100 bytes"), std::string::npos)
+        << Tree.Log();
+}
+
+}  // namespace
