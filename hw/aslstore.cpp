@@ -47,7 +47,6 @@ bool Bit(uint8_t value, unsigned bit) {
     return ((value >> bit) & 1u) != 0;
 }
 
-
 int StoreSystem(std::unique_ptr<SystemDescriptor> system, const char* title) {
     if (Tracing(TRACE_STORE_ASL | TRACE_STORE_SYSTEM)) {
         dbgprint("\n");
