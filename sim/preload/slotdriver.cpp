@@ -121,17 +121,33 @@ int AnswerTable(const std::string& run, _VELH_TABLE_XFER* transfer) {
     return 0;
 }
 
-int AnswerBlink(const std::string& run, const _VELH_BLINK* blink) {
-    char line[32];
-    const int length = std::snprintf(line, sizeof line, "%u %u\n", blink->Slot, blink->State);
-    const std::string path = DriverFile(run, "blink.log");
+// Appends one line with a single write, so that lines of concurrent requests do not mix.
+bool AppendLine(const std::string& path, const std::string& line) {
     const int fd = ::open(path.c_str(), O_WRONLY | O_CREAT | O_APPEND | O_CLOEXEC, 0644);
     if (fd < 0) {
-        return Fail(EIO);
+        return false;
     }
-    const ssize_t written = ::write(fd, line, static_cast<size_t>(length));
+    const std::string text = line + "\n";
+    const ssize_t written = ::write(fd, text.data(), text.size());
     ::close(fd);
-    return written == length ? 0 : Fail(EIO);
+    return written == static_cast<ssize_t>(text.size());
+}
+
+std::string BlinkText(const _VELH_BLINK& blink) {
+    return std::to_string(blink.Slot) + " " + std::to_string(blink.State);
+}
+
+// The request log only watches the driver: failing to write it changes no answer, but says so,
+// because a test that looks for missing lines would otherwise pass on an empty log.
+void LogRequest(const std::string& run, const std::string& request) {
+    const std::string path = DriverFile(run, "requests.log");
+    if (!AppendLine(path, request)) {
+        std::fprintf(stderr, "velhsim: %s: %s\n", path.c_str(), std::strerror(errno));
+    }
+}
+
+int AnswerBlink(const std::string& run, const _VELH_BLINK* blink) {
+    return AppendLine(DriverFile(run, "blink.log"), BlinkText(*blink)) ? 0 : Fail(EIO);
 }
 
 }  // namespace
@@ -163,6 +179,7 @@ int DriverOpen(const std::string& run, int flags) {
     if (!IsDirectory(JoinPath(run, "driver"))) {
         return Fail(ENOENT);
     }
+    LogRequest(run, "open");
     if (const std::optional<int> error = InjectedFailure(run, "open")) {
         return Fail(*error);
     }
@@ -201,9 +218,17 @@ int DriverIoctl(const std::string& run, unsigned long request, void* argument) {
         case VELH_IOCTL_BLINK:
             name = "blink";
             break;
-        default:
+        default: {
+            char code[32];
+            std::snprintf(code, sizeof code, "ioctl 0x%lx", request);
+            LogRequest(run, code);
             return Fail(ENOTTY);
+        }
     }
+    const bool blinkWithArgument = request == VELH_IOCTL_BLINK && argument != nullptr;
+    LogRequest(run, blinkWithArgument ? std::string(name) + " " +
+                                            BlinkText(*static_cast<const _VELH_BLINK*>(argument))
+                                      : std::string(name));
     if (const std::optional<int> error = InjectedFailure(run, name)) {
         return Fail(*error);
     }

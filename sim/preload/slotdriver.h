@@ -1,9 +1,10 @@
 // The emulated hot-plug slot driver behind /dev/velhpdrv, answered from the run folder's driver/:
 // "version" (three numbers), "asl.bin" (the table it hands out), "blink.log" (one "SLOT STATE" line
-// per blink request) and "fail" (requests that are to fail, one per line: a request name, open,
-// version, size, table or blink, and optionally the errno name or number to fail with, EIO when
-// none is given). The files are read at every request, so a test may change them while the
-// command runs.
+// per blink request), "requests.log" (written: one line per request received, failed or not:
+// "open", "version", "size", "table", "blink SLOT STATE" or "ioctl 0xCODE") and "fail" (requests
+// that are to fail, one per line: a request name, open, version, size, table or blink, and
+// optionally the errno name or number to fail with, EIO when none is given). The files are read at
+// every request, so a test may change them while the command runs.
 #pragma once
 
 #include <optional>

@@ -30,8 +30,11 @@ import java.util.stream.Stream;
  *
  * With {@link #onMachine} the JVM runs under the simulator (sim/velhsim in the build
  * directory), which copies the machine folder to ROOT/run and runs the JVM in ROOT/run/install.
+ * {@link #editMachine} changes the copy first (failure injection, extra install files), so the
+ * machine folders in the source tree stay as they are.
  *
- * <p>Needs the system properties velh.build.dir, velh.agent.jar and velh.test.jar.
+ * <p>Needs the system properties velh.build.dir, velh.agent.jar and velh.test.jar, and for
+ * {@link #sampleMachine} velh.machines.dir.
  */
 public final class AgentHarness {
     public static final String AGENT_CLASS = "com.korvane.sysmgt.tarnova.agent.TarnovaAgent";
@@ -45,7 +48,18 @@ public final class AgentHarness {
     private boolean jniLog;
     private Path machine;
     private final Map<String, String> environment = new LinkedHashMap<>();
-    private final List<String> jvmOptions = new ArrayList<>(List.of("-Xcheck:jni"));
+    // No perf data file: under the simulator every JVM is process 2 of its own process namespace
+    // but shares /tmp, so parallel runs would contend for one /tmp/hsperfdata_USER/2 and the
+    // loser warns on standard output, in the middle of what the tests read.
+    private final List<String> jvmOptions =
+        new ArrayList<>(List.of("-Xcheck:jni", "-XX:-UsePerfData"));
+    private final List<MachineEdit> machineEdits = new ArrayList<>();
+
+    /** A change to the run's copy of the machine folder, made before the simulator starts. */
+    @FunctionalInterface
+    public interface MachineEdit {
+        void apply(Path machine) throws IOException;
+    }
 
     /** @param base the folder under which every run gets its root (a test's temporary folder) */
     public AgentHarness(Path base) {
@@ -58,6 +72,11 @@ public final class AgentHarness {
             throw new IllegalStateException("system property " + name + " is not set");
         }
         return value;
+    }
+
+    /** A machine folder of sim/machines. */
+    public static Path sampleMachine(String name) {
+        return Path.of(property("velh.machines.dir")).resolve(name);
     }
 
     /** How often part occurs in text. */
@@ -79,6 +98,21 @@ public final class AgentHarness {
     public AgentHarness onMachine(Path machineFolder) {
         machine = machineFolder;
         return this;
+    }
+
+    /** Changes the run's copy of the machine folder; edits apply in the order given. */
+    public AgentHarness editMachine(MachineEdit edit) {
+        machineEdits.add(edit);
+        return this;
+    }
+
+    /** Writes a file into the run's copy of the machine folder (replacing any). */
+    public AgentHarness withMachineFile(String relativePath, String content) {
+        return editMachine(machine -> {
+            Path file = machine.resolve(relativePath);
+            Files.createDirectories(file.getParent());
+            Files.writeString(file, content);
+        });
     }
 
     public AgentHarness withEnvironment(String name, String value) {
@@ -121,6 +155,9 @@ public final class AgentHarness {
         if (machine != null) {
             Path machineCopy = root.resolve("machine");
             copyTree(machine, machineCopy);
+            for (MachineEdit edit : machineEdits) {
+                edit.apply(machineCopy);
+            }
             setJniLog(machineCopy.resolve("log"));
             command.addAll(List.of(buildDir.resolve("sim/velhsim").toString(), "--machine",
                 machineCopy.toString(), "--run-dir", run.toString(), "--"));
@@ -219,6 +256,35 @@ public final class AgentHarness {
         /** The hardware-information log, or null when there is no such file. */
         public String hwLog() {
             return readIfExists(logDir.resolve("velhslot.slotmgr.hwinfo.log"));
+        }
+
+        /** The JSON document that the run printed: all of standard output (the agent's --json). */
+        public Map<String, Object> document() {
+            return document(stdout);
+        }
+
+        /** A JSON document of the run; a text that is none fails with the whole run shown. */
+        @SuppressWarnings("unchecked")
+        public Map<String, Object> document(String json) {
+            try {
+                return (Map<String, Object>) MiniJson.parse(json);
+            } catch (IllegalArgumentException | ClassCastException e) {
+                throw new AssertionError("not a JSON document (" + e.getMessage() + "): " + this, e);
+            }
+        }
+
+        /** The copy of the machine folder that the run was given (null without a machine). */
+        public Path machineCopy() {
+            Path copy = root.resolve("machine");
+            return Files.isDirectory(copy) ? copy : null;
+        }
+
+        /**
+         * The requests that the emulated slot driver received, one line each ("open",
+         * "version", "size", "table", "blink SLOT STATE"); empty when it received none.
+         */
+        public List<String> driverRequests() {
+            return lines(runDir.resolve("driver/requests.log"));
         }
 
         /**

@@ -1,6 +1,8 @@
 package com.korvane.sysmgt.tarnova.agent.e2e;
 
 import com.korvane.sysmgt.tarnova.agent.TarnovaAgent;
+import com.korvane.sysmgt.tarnova.agent.cli.Inventory;
+import com.korvane.sysmgt.tarnova.agent.cli.JsonWriter;
 import java.io.IOException;
 import java.nio.file.Files;
 import java.nio.file.Path;
@@ -18,6 +20,8 @@ import java.util.stream.Stream;
  *   version                  version=getAgentVersionInv()
  *   status                   status=getAgentNumInv()
  *   inventories              inventories=the lengths of the eight inventories (null: "null")
+ *   json                     json=the agent's JSON document on one line: the whole lifecycle
+ *                            (debug, hwinfo, the inventories, version, status, exit)
  *   blink:SLOT:STATE         BlinkCmd(SLOT, STATE)
  *   sleep:MILLIS             waits
  *   children                 children=N zombies=Z, the child processes of this JVM
@@ -49,6 +53,11 @@ public final class Scenario {
                     break;
                 case "inventories":
                     System.out.println("inventories=" + inventoryLengths(agent));
+                    break;
+                case "json":
+                    // JSON needs no line ends: strings carry theirs escaped.
+                    System.out.println("json="
+                        + JsonWriter.write(Inventory.collect(agent)).replace("\n", ""));
                     break;
                 case "blink":
                     agent.BlinkCmd(Long.parseLong(parts[1]), Integer.parseInt(parts[2]));
