@@ -43,3 +43,8 @@ void WidenBytes(const char* source, size_t count, wchar_t* target);
 // is terminated and cut to fit even when the result is negative.
 int varargs(wchar_t* out, unsigned int size, wchar_t* format, va_list arguments);
 int HexToAscii(uint32_t value, char* out, int digits);
+
+// The low 32 bits of an address, as the traces print it with "0x%08x".
+inline uint32_t TraceAddress(const void* address) {
+    return static_cast<uint32_t>(reinterpret_cast<uintptr_t>(address));
+}

@@ -18,11 +18,6 @@ constexpr uint32_t ASL_FIXED_DESCRIPTOR_SIZE = 16;
 // told within `available` bytes (a string with no terminator among them).
 uint32_t DescriptorSize(const RAW_ASL_DATA* descriptor, uint32_t available);
 
-// The low 32 bits of an address, as the traces print it with "0x%08x".
-inline uint32_t TraceAddress(const void* address) {
-    return static_cast<uint32_t>(reinterpret_cast<uintptr_t>(address));
-}
-
 // True when the packet's first four of `size` bytes are the signature "VHSL".
 bool IsAslPacket(const _ASL_PACKET* packet, uint32_t size);
 
