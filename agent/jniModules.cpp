@@ -111,6 +111,7 @@ JNIEXPORT void JNICALL Java_com_korvane_sysmgt_tarnova_agent_TarnovaAgent_BlinkC
 JNIEXPORT void JNICALL Java_com_korvane_sysmgt_tarnova_agent_TarnovaAgent_getReadyToExit(JNIEnv*,
                                                                                          jobject) {
     Guarded([] {
+        // Only a killall that was started may be reported as stopping the monitor.
         if (LaunchDetached("killall", "slotwatch")) {
             JniLog("slotwatch is stopped \n");
         }
