@@ -9,28 +9,13 @@
 #include <new>
 
 #include "diag/hwdebug.h"
+#include "util/filehandle.h"
 #include "util/sysaccess.h"
 
 _VPD_LAYOUT Vpd;
 bool ValidVPD = false;
 
 namespace {
-
-class Descriptor {
-  public:
-    explicit Descriptor(int fd) : Fd(fd) {}
-    ~Descriptor() {
-        if (Fd >= 0) {
-            close(Fd);
-        }
-    }
-    Descriptor(const Descriptor&) = delete;
-    Descriptor& operator=(const Descriptor&) = delete;
-    int Get() const { return Fd; }
-
-  private:
-    int Fd;
-};
 
 // Reads up to size bytes, going on after short reads; the count read, or -1 on an error.
 int32_t ReadFully(int fd, uint8_t* buffer, uint32_t size) {
@@ -67,7 +52,7 @@ bool GetVPD(_VPD_LAYOUT* vpd) {
         return false;
     }
     const char* device = SysPaths().DevMem.c_str();
-    Descriptor memory(open(device, O_RDONLY));
+    const UniqueFd memory(open(device, O_RDONLY));
     if (memory.Get() < 0) {
         LastErr(nullptr, "GetVPD()", "error opening memory file %S\n",
                 MakeWideString(device, WideBuffer));

@@ -12,6 +12,7 @@
 
 #include "diag/hwdebug.h"
 #include "diag/progname.h"
+#include "util/filehandle.h"
 #include "util/sysaccess.h"
 #include "velhpdrv.h"
 
@@ -23,8 +24,8 @@ class DriverDevice {
     // Opens the device; a failure is reported under `function`.
     explicit DriverDevice(const char* function) {
         const std::string& path = SysPaths().SlotDriver;
-        Fd = open(path.c_str(), O_RDWR);
-        if (Fd < 0) {
+        Fd.Reset(open(path.c_str(), O_RDWR));
+        if (!Fd) {
             const int32_t error = errno;
             wchar_t widePath[WIDE_BUFFER_CHARS];
             LastErr(&error, function, "Open \"%S\" failed", MakeWideString(path.c_str(), widePath));
@@ -32,24 +33,18 @@ class DriverDevice {
     }
     DriverDevice(const DriverDevice&) = delete;
     DriverDevice& operator=(const DriverDevice&) = delete;
-    ~DriverDevice() { Close(); }
 
-    bool IsOpen() const { return Fd >= 0; }
+    bool IsOpen() const { return static_cast<bool>(Fd); }
 
     // Sends one request; on failure returns false with errno as the driver left it.
     bool Request(unsigned long request, void* argument) const {
-        return SysCalls().Ioctl(Fd, request, argument) >= 0;
+        return SysCalls().Ioctl(Fd.Get(), request, argument) >= 0;
     }
 
-    void Close() {
-        if (Fd >= 0) {
-            close(Fd);
-            Fd = -1;
-        }
-    }
+    void Close() { Fd.Reset(); }
 
   private:
-    int Fd = -1;
+    UniqueFd Fd;
 };
 
 // Reports a failed request or allocation with the error number it left.

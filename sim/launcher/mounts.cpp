@@ -16,7 +16,7 @@
 #include <vector>
 
 #include "sim/common/textfile.h"
-#include "sim/common/uniquefd.h"
+#include "util/filehandle.h"
 
 namespace velhsim {
 

@@ -9,7 +9,7 @@
 #include <filesystem>
 
 #include "sim/common/textfile.h"
-#include "sim/common/uniquefd.h"
+#include "util/filehandle.h"
 
 namespace velhsim {
 

@@ -23,12 +23,10 @@
 #include <string>
 #include <vector>
 
-#include "sim/common/uniquefd.h"
+#include "util/filehandle.h"
 #include "velhpdrv.h"
 
 namespace {
-
-using velhsim::UniqueFd;
 
 int Error() {
     const char* name = strerrorname_np(errno);

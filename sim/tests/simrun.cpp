@@ -11,8 +11,8 @@
 #include <system_error>
 
 #include "sim/common/textfile.h"
-#include "sim/common/uniquefd.h"
 #include "sim/launcher/process.h"
+#include "util/filehandle.h"
 
 namespace velhsim::test {
 
