@@ -158,7 +158,7 @@ int Run(const Options& options) {
             return SuperviseNamespace(first);
         }
     }
-    if (!ShowMachine(run, processNamespace, &error)) {
+    if (!ShowMachine(run, {run, origin, machine, toolDir}, processNamespace, &error)) {
         return Fail(error);
     }
     if (chdir(install.c_str()) != 0) {
