@@ -246,9 +246,13 @@ bool PrivateTemporaryFolders(const std::string& run, const std::vector<std::stri
     std::vector<std::string> paths;
     for (const std::string& path : reachable) {
         std::error_code code;
-        const std::string real = std::filesystem::weakly_canonical(path, code).string();
-        if (!code && InTemporaryFolder(real)) {
-            paths.push_back(real);
+        std::filesystem::path real = std::filesystem::weakly_canonical(path, code);
+        // A file is shown with its folder.
+        if (!code && !IsDirectory(real.string())) {
+            real = real.parent_path();
+        }
+        if (!code && InTemporaryFolder(real.string())) {
+            paths.push_back(real.string());
         }
     }
     // Shortest first, and none inside another: binding the outer brings the inner along.
