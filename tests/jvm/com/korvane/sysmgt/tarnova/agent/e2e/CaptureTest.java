@@ -47,7 +47,7 @@ class CaptureTest {
 
     @Test
     void aSimulatedMachineComesBackWithItsFunctionsDriverAndInventories() throws Exception {
-        Path sample = AgentHarness.sampleMachine("x440-chassis-drawer");
+        Path sample = AgentHarness.sampleMachine("chassis-drawer");
         Path copy = temp.resolve("copy");
         Path run = temp.resolve("run");
         capture(copy, buildDir + "/sim/velhsim", "--machine", sample.toString(), "--run-dir",
