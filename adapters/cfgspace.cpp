@@ -9,7 +9,7 @@
 #include <cwchar>
 
 #include "diag/hwdebug.h"
-#include "util/filehandle.h"
+#include "filehandle.h"
 
 namespace {
 
