@@ -5,7 +5,7 @@
 
 #include <cstddef>
 
-#include "util/filehandle.h"
+#include "filehandle.h"
 
 class BlockLines {
   public:
