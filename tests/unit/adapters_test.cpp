@@ -6,6 +6,7 @@
 #include <vector>
 
 #include "adapters/cfgspace.h"
+#include "adapters/linadapt.h"
 #include "hw/adapterxref.h"
 #include "hw/busspeed.h"
 #include "scratchdir.h"
@@ -100,6 +101,28 @@ TEST(StorePciConfig, BridgesHideTheirSubsystemInPciId) {
         StorePciConfig(&config, &adapter, 64);
         EXPECT_EQ(adapter.HasBridge, c.Bridge) << c.HeaderType;
         EXPECT_EQ(adapter.PciId, c.PciId) << c.HeaderType;
+    }
+}
+
+TEST(ProcBusPci, NamesOfBusFoldersAndFunctionFiles) {
+    const std::pair<const char*, int64_t> busses[] = {
+        {"00", 0}, {"1f", 0x1f}, {"0000:00", 0}, {"0000:0a", 10}, {"0000:zz", -1}, {"x1", -1}};
+    for (auto [name, expected] : busses) {
+        _FILE_ATTRIBS attribs{};
+        std::strcpy(attribs.EntryName, name);
+        uint32_t bus = 0;
+        EXPECT_EQ(isBus(&attribs, &bus) ? int64_t{bus} : -1, expected) << name;
+    }
+    const std::pair<const char*, int64_t> functions[] = {
+        {"1f.3", 0x1f3}, {"00.0", 0}, {"00.10", -1}, {"000.0", -1}, {"0x.1", -1}, {"devices", -1}};
+    for (auto [name, expected] : functions) {
+        _FILE_ATTRIBS attribs{};
+        std::strcpy(attribs.EntryName, name);
+        uint32_t device = 0;
+        uint32_t function = 0;
+        EXPECT_EQ(isAdapter(&attribs, &device, &function) ? int64_t{device << 4 | function} : -1,
+                  expected)
+            << name;
     }
 }
 
