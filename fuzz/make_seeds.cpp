@@ -9,6 +9,7 @@
 #include <cstdio>
 #include <cstring>
 #include <string>
+#include <tuple>
 #include <vector>
 
 #include "adapters/linvpd.h"
@@ -185,31 +186,25 @@ bool WriteModuleSeeds(const std::string& dir) {
     return ok;
 }
 
-// A configuration file of `size` bytes with the capability bit, the list's first pointer and the
-// given bytes set.
-std::vector<uint8_t> ConfigFile(size_t size, uint8_t first, std::vector<std::pair<int, int>> set) {
-    std::vector<uint8_t> file(size, 0);
-    file[0] = 0x34;
-    file[1] = 0x12;
-    file[6] = 0x30;
-    file[0x34] = first;
-    for (auto [at, value] : set) {
-        file[at] = static_cast<uint8_t>(value);
-    }
-    return file;
-}
-
+// Configuration files: the capability bit and the given bytes set. Current kernels hand out
+// 4096 bytes, so items may reach past the image.
 bool WriteConfigSeeds(const std::string& dir) {
-    bool ok = Write(dir + "/header-only.bin", ConfigFile(64, 0x40, {}));
-    ok &= Write(dir + "/pm-msi64.bin",
-                ConfigFile(256, 0x40, {{0x40, 1}, {0x41, 0x50}, {0x50, 5}, {0x52, 0x80}}));
-    ok &= Write(dir + "/unknown-then-pcix.bin",
-                ConfigFile(256, 0x40, {{0x40, 9}, {0x41, 0x50}, {0x50, 7}, {0x56, 3}}));
-    ok &= Write(dir + "/loop.bin",
-                ConfigFile(256, 0x40, {{0x40, 1}, {0x41, 0x48}, {0x48, 7}, {0x49, 0x40}}));
-    // Current kernels hand out 4096 bytes: items near the image's end.
-    ok &= Write(dir + "/pcix-at-end.bin", ConfigFile(4096, 0xF8, {{0xF8, 7}, {0xFE, 3}}));
-    ok &= Write(dir + "/msi-past-end.bin", ConfigFile(4096, 0xF4, {{0xF4, 5}, {0xF6, 0x80}}));
+    const std::tuple<const char*, size_t, std::vector<std::pair<int, int>>> seeds[] = {
+        {"header-only", 64, {{0x34, 0x40}}},
+        {"pm-msi64", 256, {{0x34, 0x40}, {0x40, 1}, {0x41, 0x50}, {0x50, 5}, {0x52, 0x80}}},
+        {"unknown-then-pcix", 256, {{0x34, 0x40}, {0x40, 9}, {0x41, 0x50}, {0x50, 7}}},
+        {"loop", 256, {{0x34, 0x40}, {0x40, 1}, {0x41, 0x48}, {0x48, 7}, {0x49, 0x40}}},
+        {"pcix-at-end", 4096, {{0x34, 0xF8}, {0xF8, 7}, {0xFE, 3}}},
+        {"msi-past-end", 4096, {{0x34, 0xF4}, {0xF4, 5}, {0xF6, 0x80}}}};
+    bool ok = true;
+    for (const auto& [name, size, set] : seeds) {
+        std::vector<uint8_t> bytes(size);
+        bytes[6] = 0x10;
+        for (auto [at, value] : set) {
+            bytes[at] = static_cast<uint8_t>(value);
+        }
+        ok &= Write(dir + "/" + name + ".bin", bytes);
+    }
     return ok;
 }
 
