@@ -1,0 +1,54 @@
+import com.korvane.sysmgt.tarnova.agent.TarnovaAgent;
+import java.util.Arrays;
+
+/**
+ * Times the library in one JVM: after WARMUP acquisitions, ROUNDS acquisitions (getHwInfoReady,
+ * timed around the native call) each followed by the eight inventory exports (timed together).
+ * Prints the medians in milliseconds and the number of adapters the last acquisition reported.
+ *
+ * <p>java -cp tarnova-agent.jar:CLASSES AcquireBench WARMUP ROUNDS
+ */
+public final class AcquireBench {
+    private AcquireBench() {}
+
+    private static double median(long[] nanos) {
+        long[] sorted = nanos.clone();
+        Arrays.sort(sorted);
+        int n = sorted.length;
+        double middle = n % 2 == 1 ? sorted[n / 2] : (sorted[n / 2 - 1] + sorted[n / 2]) / 2.0;
+        return middle / 1e6;
+    }
+
+    private static int exportAll(TarnovaAgent agent) {
+        int elements = agent.getBusNumInv().length + agent.getSlotNumInv().length
+                + agent.getSystemNumInv().length + agent.getSystemNameInv().length
+                + agent.getAdapterNameInv().length + agent.getAdapterPCIIDInv().length
+                + agent.getAdapterDriverInv().length;
+        return elements + agent.getAdapterNumInv().length;
+    }
+
+    public static void main(String[] args) {
+        int warmup = Integer.parseInt(args[0]);
+        int rounds = Integer.parseInt(args[1]);
+        TarnovaAgent agent = new TarnovaAgent();
+        for (int i = 0; i < warmup; i++) {
+            agent.getHwInfoReady();
+            exportAll(agent);
+        }
+        long[] acquire = new long[rounds];
+        long[] exports = new long[rounds];
+        for (int i = 0; i < rounds; i++) {
+            long start = System.nanoTime();
+            agent.getHwInfoReady();
+            long acquired = System.nanoTime();
+            exportAll(agent);
+            exports[i] = System.nanoTime() - acquired;
+            acquire[i] = acquired - start;
+        }
+        System.out.printf("acquire %.3f%n", median(acquire));
+        System.out.printf("exports %.3f%n", median(exports));
+        System.out.printf("adapters %d%n", agent.getAdapterNumInv().length);
+        System.out.printf("slots %d%n", agent.getSlotNumInv().length);
+        agent.getReadyToExit();
+    }
+}
