@@ -1,5 +1,6 @@
 // Writes the binary seed corpora: ASL packets for fuzz_aslstore, BIOS segment tails for
-// fuzz_vpd and query_module answers for fuzz_modquery. Run by hand after changing it:
+// fuzz_vpd, query_module answers for fuzz_modquery and configuration files for fuzz_cfgspace. Run
+// by hand after changing it:
 //   cmake --build build-fuzz --target make_seeds && build-fuzz/fuzz/make_seeds fuzz/corpus
 #include <sys/stat.h>
 
@@ -184,6 +185,34 @@ bool WriteModuleSeeds(const std::string& dir) {
     return ok;
 }
 
+// A configuration file of `size` bytes with the capability bit, the list's first pointer and the
+// given bytes set.
+std::vector<uint8_t> ConfigFile(size_t size, uint8_t first, std::vector<std::pair<int, int>> set) {
+    std::vector<uint8_t> file(size, 0);
+    file[0] = 0x34;
+    file[1] = 0x12;
+    file[6] = 0x30;
+    file[0x34] = first;
+    for (auto [at, value] : set) {
+        file[at] = static_cast<uint8_t>(value);
+    }
+    return file;
+}
+
+bool WriteConfigSeeds(const std::string& dir) {
+    bool ok = Write(dir + "/header-only.bin", ConfigFile(64, 0x40, {}));
+    ok &= Write(dir + "/pm-msi64.bin",
+                ConfigFile(256, 0x40, {{0x40, 1}, {0x41, 0x50}, {0x50, 5}, {0x52, 0x80}}));
+    ok &= Write(dir + "/unknown-then-pcix.bin",
+                ConfigFile(256, 0x40, {{0x40, 9}, {0x41, 0x50}, {0x50, 7}, {0x56, 3}}));
+    ok &= Write(dir + "/loop.bin",
+                ConfigFile(256, 0x40, {{0x40, 1}, {0x41, 0x48}, {0x48, 7}, {0x49, 0x40}}));
+    // Current kernels hand out 4096 bytes: items near the image's end.
+    ok &= Write(dir + "/pcix-at-end.bin", ConfigFile(4096, 0xF8, {{0xF8, 7}, {0xFE, 3}}));
+    ok &= Write(dir + "/msi-past-end.bin", ConfigFile(4096, 0xF4, {{0xF4, 5}, {0xF6, 0x80}}));
+    return ok;
+}
+
 // Marker symbols for fuzz_naming (selector byte 2): a whole one, one without its two parts.
 bool WriteMarkerSeeds(const std::string& dir) {
     const unsigned long names = 2 * sizeof(module_symbol);
@@ -204,6 +233,7 @@ int main(int argc, char** argv) {
     }
     const std::string corpus = argv[1];
     const bool ok = WriteAslSeeds(corpus + "/aslstore") && WriteVpdSeeds(corpus + "/vpd") &&
-                    WriteModuleSeeds(corpus + "/modquery") && WriteMarkerSeeds(corpus + "/naming");
+                    WriteModuleSeeds(corpus + "/modquery") &&
+                    WriteMarkerSeeds(corpus + "/naming") && WriteConfigSeeds(corpus + "/cfgspace");
     return ok ? 0 : 1;
 }
