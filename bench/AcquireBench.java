@@ -1,10 +1,13 @@
 import com.korvane.sysmgt.tarnova.agent.TarnovaAgent;
+import java.lang.management.ManagementFactory;
+import java.lang.management.ThreadMXBean;
 import java.util.Arrays;
 
 /**
  * Times the library in one JVM: after WARMUP acquisitions, ROUNDS acquisitions (getHwInfoReady,
  * timed around the native call) each followed by the eight inventory exports (timed together).
- * Prints the medians in milliseconds and the number of adapters the last acquisition reported.
+ * Prints the medians in milliseconds (acquisition also as the calling thread's processor time)
+ * and the number of adapters and slots the last acquisition reported.
  *
  * <p>java -cp tarnova-agent.jar:CLASSES AcquireBench WARMUP ROUNDS
  */
@@ -35,17 +38,22 @@ public final class AcquireBench {
             agent.getHwInfoReady();
             exportAll(agent);
         }
+        ThreadMXBean threads = ManagementFactory.getThreadMXBean();
         long[] acquire = new long[rounds];
+        long[] processor = new long[rounds];
         long[] exports = new long[rounds];
         for (int i = 0; i < rounds; i++) {
+            long cpuStart = threads.getCurrentThreadCpuTime();
             long start = System.nanoTime();
             agent.getHwInfoReady();
             long acquired = System.nanoTime();
+            processor[i] = threads.getCurrentThreadCpuTime() - cpuStart;
             exportAll(agent);
             exports[i] = System.nanoTime() - acquired;
             acquire[i] = acquired - start;
         }
         System.out.printf("acquire %.3f%n", median(acquire));
+        System.out.printf("acquire_cpu %.3f%n", median(processor));
         System.out.printf("exports %.3f%n", median(exports));
         System.out.printf("adapters %d%n", agent.getAdapterNumInv().length);
         System.out.printf("slots %d%n", agent.getSlotNumInv().length);

@@ -1,6 +1,7 @@
 // The readers that name an adapter and find its driver, chosen by the first byte:
-//   0  the PCI ID database: four little-endian 16-bit IDs, then the database. The name must be
-//      the one a plain line-by-line reading of the same lines gives.
+//   0  the PCI ID database: four little-endian 16-bit IDs, a byte that places the end of the
+//      first read block (4 times its value into the database, after a long comment line), then
+//      the database. The name must be the one a plain line-by-line reading gives.
 //   1  the PCI device list: bus and devfn bytes, then the list.
 //   2  a module's symbol list: a little-endian 16-bit count, then the buffer query_module fills.
 //   3  /etc/sysconfig/kernel.
@@ -86,7 +87,7 @@ std::string PlainLookup(const std::string& text, const char keys[4][5]) {
 }
 
 void Lookup(const uint8_t* data, size_t size) {
-    if (size < 8) {
+    if (size < 9) {
         return;
     }
     _PCI_CONFIG0 config{};
@@ -94,7 +95,10 @@ void Lookup(const uint8_t* data, size_t size) {
     config.DeviceID = static_cast<uint16_t>(data[2] | data[3] << 8);
     config.SubSysVendorID = static_cast<uint16_t>(data[4] | data[5] << 8);
     config.SubSystemID = static_cast<uint16_t>(data[6] | data[7] << 8);
-    WriteFile(SysPaths().PciIds, data + 8, size - 8);
+    constexpr size_t FIRST_BLOCK = 64 * 1024 - 1;
+    std::string text = "#" + std::string(FIRST_BLOCK - 4 * data[8] - 2, '-') + "\n";
+    text.append(data + 9, data + size);
+    WriteFile(SysPaths().PciIds, reinterpret_cast<const uint8_t*>(text.data()), text.size());
     AdapterDescriptor adapter;
     if (!GetAdapterName(&adapter, &config)) {
         Violated("the database could not be read");
@@ -105,7 +109,7 @@ void Lookup(const uint8_t* data, size_t size) {
     std::snprintf(keys[2], 5, "%04x", config.SubSysVendorID);
     std::snprintf(keys[3], 5, "%04x", config.SubSystemID);
     std::wstring plain;
-    for (char c : PlainLookup(std::string(data + 8, data + size), keys)) {
+    for (char c : PlainLookup(text, keys)) {
         plain += static_cast<wchar_t>(static_cast<unsigned char>(c));  // widened byte by byte
     }
     if (adapter.Name != plain) {

@@ -31,6 +31,52 @@ bool IsCandidate(const char* line, const char* end, unsigned depth, char first, 
     return line[depth] == first && line[depth + 1] == second;
 }
 
+// Bytes looked at together when skipping: four vectors, so that one rarely taken branch serves
+// them all.
+constexpr size_t RUN_BYTES = 64;
+
+#if defined(__SSE2__)
+__m128i Load(const char* bytes) {
+    return _mm_loadu_si128(reinterpret_cast<const __m128i*>(bytes));
+}
+
+// The candidate line starts among the 16 bytes at block: a line feed followed by fewer than
+// Depth tabs, or by Depth tabs and the two key bytes.
+template <unsigned Depth>
+__m128i Candidates(const char* block, __m128i first, __m128i second) {
+    __m128i wanted = _mm_and_si128(_mm_cmpeq_epi8(Load(block + 1 + Depth), first),
+                                   _mm_cmpeq_epi8(Load(block + 2 + Depth), second));
+    for (unsigned t = 0; t < Depth; ++t) {
+        __m128i tab = _mm_cmpeq_epi8(Load(block + 1 + t), _mm_set1_epi8('\t'));
+        wanted = _mm_or_si128(wanted, _mm_andnot_si128(tab, _mm_set1_epi8(-1)));
+    }
+    return _mm_and_si128(_mm_cmpeq_epi8(Load(block), _mm_set1_epi8('\n')), wanted);
+}
+#endif
+
+// From at, skips the runs of RUN_BYTES that hold no candidate line start; returns where a run
+// that may hold one begins, or where too few bytes are left for a whole run.
+template <unsigned Depth>
+size_t SkipPlainRuns(const char* buffer, size_t at, size_t end, char first, char second) {
+#if defined(__SSE2__)
+    const __m128i keyFirst = _mm_set1_epi8(first);
+    const __m128i keySecond = _mm_set1_epi8(second);
+    for (; at + RUN_BYTES + Depth + 2 <= end; at += RUN_BYTES) {
+        const char* run = buffer + at;
+        __m128i any = _mm_or_si128(_mm_or_si128(Candidates<Depth>(run, keyFirst, keySecond),
+                                                Candidates<Depth>(run + 16, keyFirst, keySecond)),
+                                   _mm_or_si128(Candidates<Depth>(run + 32, keyFirst, keySecond),
+                                                Candidates<Depth>(run + 48, keyFirst, keySecond)));
+        if (_mm_movemask_epi8(any) != 0) {
+            break;
+        }
+    }
+#else
+    (void)buffer, (void)end, (void)first, (void)second;
+#endif
+    return at;
+}
+
 }  // namespace
 
 bool BlockLines::Open(const char* path) {
@@ -160,39 +206,30 @@ const char* BlockLines::NextCandidate(unsigned depth, char first, char second, s
 size_t BlockLines::FindCandidate(size_t from, unsigned depth, char first, char second) const {
     const char* buffer = Buffer.get();
     size_t at = from;
-#if defined(__SSE2__)
-    // Sixteen line starts at a time: a line feed, then (after it) too few tabs or the key.
-    const __m128i feed = _mm_set1_epi8('\n');
-    const __m128i tab = _mm_set1_epi8('\t');
-    const __m128i keyFirst = _mm_set1_epi8(first);
-    const __m128i keySecond = _mm_set1_epi8(second);
-    const __m128i ones = _mm_set1_epi8(-1);
-    auto load = [](const char* bytes) {
-        return _mm_loadu_si128(reinterpret_cast<const __m128i*>(bytes));
-    };
-    for (; at + 16 + depth + 2 <= End; at += 16) {
-        const char* block = buffer + at;
-        __m128i starts = _mm_cmpeq_epi8(load(block), feed);
-        if (_mm_movemask_epi8(starts) == 0) {
-            continue;
+    for (;;) {
+        switch (depth) {
+            case 0:
+                at = SkipPlainRuns<0>(buffer, at, End, first, second);
+                break;
+            case 1:
+                at = SkipPlainRuns<1>(buffer, at, End, first, second);
+                break;
+            case 2:
+                at = SkipPlainRuns<2>(buffer, at, End, first, second);
+                break;
+            default:
+                break;
         }
-        __m128i wanted = _mm_and_si128(_mm_cmpeq_epi8(load(block + 1 + depth), keyFirst),
-                                       _mm_cmpeq_epi8(load(block + 2 + depth), keySecond));
-        for (unsigned t = 0; t < depth; ++t) {
-            wanted = _mm_or_si128(wanted,
-                                  _mm_andnot_si128(_mm_cmpeq_epi8(load(block + 1 + t), tab), ones));
+        // Byte by byte through the run that may hold a candidate, or through the last bytes.
+        size_t stop = at + RUN_BYTES < End ? at + RUN_BYTES : End;
+        for (; at < stop; ++at) {
+            if (buffer[at] == '\n' &&
+                IsCandidate(buffer + at + 1, buffer + End, depth, first, second)) {
+                return at + 1;
+            }
         }
-        int mask = _mm_movemask_epi8(_mm_and_si128(starts, wanted));
-        if (mask != 0) {
-            return at + static_cast<size_t>(__builtin_ctz(static_cast<unsigned>(mask))) + 1;
-        }
-    }
-#endif
-    for (; at < End; ++at) {
-        if (buffer[at] == '\n' &&
-            IsCandidate(buffer + at + 1, buffer + End, depth, first, second)) {
-            return at + 1;
+        if (at >= End) {
+            return End;
         }
     }
-    return End;
 }
