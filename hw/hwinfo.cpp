@@ -3,6 +3,8 @@
 #include <memory>
 
 #include "asl.h"
+#include "cardfile/cardfile.h"
+#include "cardfile/spclcase.h"
 #include "diag/hwdebug.h"
 #include "hw/aslstore.h"
 #include "hwobjects.h"
@@ -65,7 +67,20 @@ bool GetHwInfo() {
     TraceAcquire("GetHwInfo():  storing PCI architecture table\n");
     StoreAslTable(packet.get(), size);
 
+    TraceAcquire("GetHwInfo():  getting adapter info file\n");
+    if (GetAdapterFile() != 0) {
+        TraceAcquire("GetHwInfo():  xrefing adapter file\n");
+        XRefAdapterFile();
+        TraceAcquire("GetHwInfo():  merging adapter file()\n");
+        MergeAdapterFile();
+    }
+
     TraceAcquire("GetHwInfo():  hardware info acquired\n");
+
+    SpecialCaseSystems();
+    SpecialCaseBusses();
+    SpecialCaseSlots();
+    SpecialCaseAdapters();
     StopHwInfo();
     return true;
 }

@@ -158,7 +158,8 @@ TEST_F(HwInfoTest, ATableFromTheDriverIsStoredAndEachAcquisitionStartsAfresh) {
         EXPECT_EQ(AcquireTrace(Tree.Log()),
                   (std::vector<std::string>{
                       "getting table from file", "getting ASL table", "using PCI architecture ASL",
-                      "storing PCI architecture table", "hardware info acquired"}));
+                      "storing PCI architecture table", "getting adapter info file",
+                      "hardware info acquired"}));
     }
     BusList.BeginEnumeration();
     EXPECT_EQ(BusList.Next()->BusNum, 4u);
@@ -175,10 +176,10 @@ TEST_F(HwInfoTest, ThePciArchitectureFileTakesPrecedenceOverTheDriver) {
     ASSERT_EQ(Length(BusList), 1u);
     BusList.BeginEnumeration();
     EXPECT_EQ(BusList.Next()->BusID, 7u);
-    EXPECT_EQ(
-        AcquireTrace(Tree.Log()),
-        (std::vector<std::string>{"getting table from file", "using PCI architecture file",
-                                  "storing PCI architecture table", "hardware info acquired"}));
+    EXPECT_EQ(AcquireTrace(Tree.Log()),
+              (std::vector<std::string>{"getting table from file", "using PCI architecture file",
+                                        "storing PCI architecture table",
+                                        "getting adapter info file", "hardware info acquired"}));
 }
 
 }  // namespace
