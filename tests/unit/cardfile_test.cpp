@@ -2,6 +2,9 @@
 
 #include <gtest/gtest.h>
 
+#include <algorithm>
+#include <fstream>
+#include <iterator>
 #include <string>
 #include <vector>
 
@@ -18,13 +21,13 @@ std::string Narrow(const std::wstring& text) {
     return std::string(text.begin(), text.end());
 }
 
-std::string Record(const std::string& name, const std::string& slot) {
-    return "[" + name + "] " + slot + " 0 66 15 64 0 0 t " + ID + " drv.o ";
+std::string Slurp(const std::string& path) {
+    std::ifstream in(path, std::ios::binary);
+    return std::string(std::istreambuf_iterator<char>(in), std::istreambuf_iterator<char>());
 }
 
-std::string Block(int line, const std::string& invalid, const std::string& rule) {
-    return "\n  Error: velhadp.crd, line " + std::to_string(line) + "\n         " + invalid +
-           "\n         " + rule + "\n\n";
+std::string Record(const std::string& name, const std::string& slot) {
+    return "[" + name + "] " + slot + " 0 66 15 64 0 0 t " + ID + " drv.o ";
 }
 
 class CardFileTest : public ::testing::Test {
@@ -36,134 +39,110 @@ class CardFileTest : public ::testing::Test {
         CardDesc.reset();
         ResetPreReqState();
     }
-    // Reads the text as the card file with a fresh log; FileAdapters' names in list order.
-    std::vector<std::string> Read(const std::string& text) {
+    // Reads the text as the card file with a fresh log; a line per adapter, in file order.
+    std::string Read(const std::string& text) {
         Tree.Scratch().Write("inst/velhadp.crd", text);
         ResetDebugOut();
         const int count = GetAdapterFile();
-        std::vector<std::string> names;
+        std::string described;
         FileAdapters.BeginEnumeration();
-        while (AdapterDescriptor* adapter = FileAdapters.Next()) {
-            names.push_back(Narrow(adapter->Name));
+        while (AdapterDescriptor* a = FileAdapters.Next()) {
+            std::string line = Narrow(a->Name);
+            for (uint32_t value : {a->SlotID, a->Function, a->MaxSpeed, a->PowerReq, a->Width,
+                                   uint32_t(a->HasBridge), uint32_t(a->IsBootDev),
+                                   uint32_t(a->SupPciX), uint32_t(a->OnBoard)}) {
+                line += "|" + std::to_string(value);
+            }
+            described = line + "|" + Narrow(a->PciId) + "|" + Narrow(a->Driver) + "\n" + described;
         }
-        EXPECT_EQ(count, static_cast<int>(names.size()));
-        return names;
+        EXPECT_EQ(count, std::count(described.begin(), described.end(), '\n'));
+        return described;
     }
     InstallTree Tree;
 };
 
-TEST_F(CardFileTest, RecordsRunAcrossLinesAndRestartAtNames) {
-    const std::string lastWithoutLineEnd = "[C] 3 0\n66 15 64 0 0 0 " + ID + "\n\"c drv\"";
-    struct Case {
-        std::string text;
-        std::vector<std::string> names;
-        std::string log;
-    } cases[] = {
-        {Record("A", "1") + Record("B", "2") + "\n" + lastWithoutLineEnd, {"C", "B", "A"}, ""},
-        {"5 6 " + Record("A", "1"),
-         {"A"},
-         Block(1, "Invalid adapter name (5)", "Name must begin with '[' and end with ']'")},
-        {"[A] 1 0 " + Record("B", "2"), {"B"}, ""},
-        {"// one\n[] 1 0 66\n" + Record("B", "2"),
-         {"B"},
-         "\n  Error: velhadp.crd, line 2\n         Adapter name is blank, discarded adapter\n\n"},
-        {Record("A", "1") + "\n[B] 2 0 66 15 64 0 0 0 " + ID + "\n", {"A"}, ""},
-    };
-    for (const Case& c : cases) {
-        // A second read starts afresh: same adapters, same line numbers.
-        for (int read = 0; read < 2; ++read) {
-            EXPECT_EQ(Read(c.text), c.names) << c.text;
-            EXPECT_EQ(Tree.Log(), c.log) << c.text;
-        }
+TEST_F(CardFileTest, EveryReadGivesTheFilesAdaptersAndErrorBlocks) {
+    const std::string data = CARDFILE_TEST_DATA "/fields.";
+    for (int read = 0; read < 2; ++read) {
+        EXPECT_EQ(Read(Slurp(data + "crd")), Slurp(data + "adapters"));
+        EXPECT_EQ(Tree.Log(), Slurp(data + "log"));
     }
 }
 
-TEST_F(CardFileTest, EachFieldStoresWhatItAcceptsAndReportsTheRestOnItsLine) {
-    const std::string base[CARD_RECORD_FIELDS] = {"[Card]", "5", "1", "66", "15",   "64",
-                                                  "0",      "0", "t", ID,   "drv.o"};
-    const char* const invalid[] = {"adapter name", "Slot ID",           "Function Number",
-                                   "Bus speed",    "Power Requirement", "bus width",
-                                   "bridge value", "boot device value", "PCI-X support value",
-                                   "PCI ID"};
-    const std::string values =
-        "'0', '1', 'T', 'F', \"True\" or \"False\"\n         Non-numeric values are case "
-        "insensitive";
-    const std::string rules[] = {"Name must begin with '[' and end with ']'",
-                                 "Slot ID must be a number",
-                                 "Function Number must be a number between 0 and 7",
-                                 "Bus speed must be 33, 66, 100 or 133\n         Pre-pend or "
-                                 "append 'x' to denote PCI-X",
-                                 "Power Requirement must be 8, 15 or 25",
-                                 "Bus width must be 32 or 64",
-                                 "Bridge value must one of: " + values,
-                                 "Boot Device value must one of: " + values,
-                                 "PCI-X support value must one of: " + values,
-                                 "PCI ID must be 18 characters long"};
+// Slots 5 and 7 on bus 3; discovered: ID 2 in slot 5 (with a module and a configuration image)
+// and ID 1 in no slot. Declared: slot 5, slot 7 twice, an unknown slot and "no slot".
+TEST_F(CardFileTest, DeclaredAdaptersReplaceOrJoinAndEachListDestroysItsOwnOver50Reads) {
+    const std::string file = Record("Five", "5") + Record("Seven", "7") + Record("Nowhere", "99") +
+                             Record("NoSlot", "0xffffffff") + Record("Again", "7");
+    const std::string missing = "\n    Error:  File:  \"velhadp.crd\"\n            Slot with ID ";
+    for (int round = 0; round < 50; ++round) {
+        AdapterList.DestroyAll();
+        SlotList.DestroyAll();
+        for (uint32_t id : {5u, 7u}) {
+            SlotList.Add(new SlotDescriptor{id, 1, 3, 0, 0, id + 1, id + 10});
+        }
+        for (uint32_t slot : {NONE_VALUE, 5u}) {
+            auto* found = new AdapterDescriptor;
+            found->AdapterID = slot == 5 ? 2 : 1;
+            found->SlotID = slot;
+            found->ModuleName = DupHeapCString("mod");
+            found->ConfigSpace[0] = 0x86;
+            AdapterList.Add(found);
+        }
+        AdapterIndex = 3;
+        const std::string declared = Read(file);
+        ASSERT_EQ(std::count(declared.begin(), declared.end(), '\n'), 5);
+        XRefAdapterFile();
+        MergeAdapterFile();
+
+        std::vector<std::string> merged;
+        AdapterList.BeginEnumeration();
+        while (AdapterDescriptor* a = AdapterList.Next()) {
+            merged.push_back(
+                Narrow(a->Name) + ":" + std::to_string(a->AdapterID) + ":" +
+                std::to_string(int32_t(a->SlotID)) + ":" + std::to_string(int32_t(a->FriendlyNum)) +
+                ":" + std::to_string(int32_t(a->BusID)) + ":" + std::to_string(int32_t(a->Bus)) +
+                ":" + std::to_string(int32_t(a->Device)));
+            EXPECT_FALSE(a->OnBoard || a->ModuleName != nullptr || a->ConfigSpace[0] != 0);
+            EXPECT_EQ(Narrow(a->Driver), "drv.o");
+        }
+        EXPECT_EQ(merged,
+                  (std::vector<std::string>{"Nowhere:4:99:-1:-1:-1:-1", "Seven:3:7:17:1:3:8",
+                                            "Five:2:5:15:1:3:6", "NoSlot:1:-1:-1:-1:-1:-1"}));
+        EXPECT_EQ(AdapterIndex, 5u);
+        EXPECT_EQ(Tree.Log(), missing + "-1 not found\n\n" + missing + "99 not found\n\n");
+    }
+}
+
+TEST_F(CardFileTest, SlesEightLosesHotPlugAndOneGraphicsControllerIsABootDevice) {
     struct Case {
-        int field;
-        std::string token;
-        const char* stored;  // null: rejected
-    } cases[] = {
-        {0, "[[ My Card ]]", "My Card"},
-        {0, "[ ]", ""},
-        {0, "Card", nullptr},
-        {1, "0x1F", "31"},
-        {1, "12a", nullptr},
-        {2, "0", "0"},
-        {2, "7", "7"},
-        {2, "8", nullptr},
-        {2, "07", nullptr},
-        {2, "-1", nullptr},
-        {3, "x133", "133"},
-        {3, "133x", "133"},
-        {3, "X66", "66"},
-        {3, "x66x", "66"},
-        {3, "x", nullptr},
-        {3, "120", nullptr},
-        {3, "33.0", nullptr},
-        {4, "8", "8"},
-        {4, "10", nullptr},
-        {5, "32", "32"},
-        {5, "16", nullptr},
-        {6, "T", "1"},
-        {6, "yes", nullptr},
-        {7, "true", "1"},
-        {7, "1", "1"},
-        {7, "no", nullptr},
-        {8, "FALSE", "0"},
-        {8, "0", "0"},
-        {8, "2", nullptr},
-        {9, "0123456789ABCDEF01", "0123456789ABCDEF01"},
-        {9, ID.substr(1), nullptr},
-        {9, ID + "2", nullptr},
-        {10, "\"my  driver\"", "my  driver"},
-    };
+        const char* distributor;
+        const char* version;
+        bool hotPlug;
+    } cases[] = {{"SuSE", "SLES-8", false},
+                 {"SuSE", "SLES-9", true},
+                 {"SUSE", "SLES-8", true},
+                 {nullptr, nullptr, true}};
     for (const Case& c : cases) {
-        // One token a line under a comment: field f sits on line f + 2.
-        std::string text = "// card\n";
-        for (int field = 0; field < CARD_RECORD_FIELDS; ++field) {
-            text += (field == c.field ? c.token : base[field]) + "\n";
-        }
-        const std::vector<std::string> names = Read(text);
-        ASSERT_EQ(names.size(), c.stored != nullptr ? 1u : 0u) << c.token;
-        if (c.stored == nullptr) {
-            EXPECT_EQ(Tree.Log(),
-                      Block(c.field + 2,
-                            "Invalid " + std::string(invalid[c.field]) + " (" + c.token + ")",
-                            rules[c.field]));
-            continue;
-        }
-        FileAdapters.BeginEnumeration();
-        const AdapterDescriptor& a = *FileAdapters.Next();
-        const uint32_t numbers[] = {0,       a.SlotID,    a.Function,  a.MaxSpeed, a.PowerReq,
-                                    a.Width, a.HasBridge, a.IsBootDev, a.SupPciX};
-        const std::string stored = c.field == 0    ? Narrow(a.Name)
-                                   : c.field == 9  ? Narrow(a.PciId)
-                                   : c.field == 10 ? Narrow(a.Driver)
-                                                   : std::to_string(numbers[c.field]);
-        EXPECT_EQ(stored, c.stored) << c.token;
-        EXPECT_FALSE(a.OnBoard);
-        EXPECT_EQ(Tree.Log(), "");
+        SlotList.DestroyAll();
+        auto* slot = new SlotDescriptor{};
+        slot->SupHotPlug = true;
+        SlotList.Add(slot);
+        Distributor = c.distributor;
+        DistVersion = c.version;
+        SpecialCaseSystems();
+        SpecialCaseBusses();
+        SpecialCaseSlots();
+        EXPECT_EQ(slot->SupHotPlug, c.hotPlug) << c.version;
+    }
+    for (uint8_t subsystemLow : {0xC1, 0xC2}) {
+        auto* adapter = new AdapterDescriptor;
+        const uint8_t ids[] = {0x02, 0x10, 0x59, 0x51, 0x52, 0x7E, subsystemLow, 0x03};
+        std::copy(ids, ids + 4, adapter->ConfigSpace);
+        std::copy(ids + 4, ids + 8, adapter->ConfigSpace + 44);
+        AdapterList.Add(adapter);
+        SpecialCaseAdapters();
+        EXPECT_EQ(adapter->IsBootDev, subsystemLow == 0xC1);
     }
 }
 
