@@ -11,6 +11,7 @@
 #include "setup/linsetup.h"
 #include "sources/filetabl.h"
 #include "sources/linhw.h"
+#include "util/debuglevel.h"
 
 namespace {
 
