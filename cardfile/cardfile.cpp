@@ -7,7 +7,7 @@
 
 #include "diag/hwdebug.h"
 #include "diag/linport.h"
-#include "util/filehandle.h"
+#include "filehandle.h"
 #include "util/instdir.h"
 #include "util/parstool.h"
 
