@@ -144,13 +144,13 @@ std::vector<uint8_t> Join(std::initializer_list<std::vector<uint8_t>> parts) {
 
 // The harness puts each seed at the end of the BIOS segment.
 bool WriteVpdSeeds(const std::string& dir) {
-    const std::vector<uint8_t> record = Record("8687K2A");
+    const std::vector<uint8_t> record = Record("K210K2A");
     const std::vector<uint8_t> tail(100, 0xFF);
     // The last position where a whole record fits.
     bool ok = Write(dir + "/record-at-end.bin", record);
     // A record cut by the end of the segment is not found.
     ok &= Write(dir + "/record-cut.bin", std::vector<uint8_t>(record.begin(), record.end() - 1));
-    ok &= Write(dir + "/two-records.bin", Join({record, tail, Record("8686R1X"), tail}));
+    ok &= Write(dir + "/two-records.bin", Join({record, tail, Record("K360R1X"), tail}));
     // A header followed by another signature, then the record.
     ok &= Write(dir + "/false-start.bin",
                 Join({{0xAA, 0x55, 'V', 'P', 'X', 0xAA, 0xAA, 0x55}, record, tail}));
