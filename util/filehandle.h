@@ -1,47 +1,5 @@
-// Owning handles for C library resources: a stdio stream, malloc'ed memory, a file descriptor.
+// The owning handles live in include/filehandle.h, below every folder of the library; this
+// name stays for sources written against it.
 #pragma once
 
-#include <unistd.h>
-
-#include <cstdio>
-#include <cstdlib>
-#include <memory>
-#include <utility>
-
-struct FileCloser {
-    void operator()(FILE* file) const { std::fclose(file); }
-};
-using UniqueFile = std::unique_ptr<FILE, FileCloser>;
-
-struct MallocFreer {
-    void operator()(void* memory) const { std::free(memory); }
-};
-template <typename T>
-using UniqueMalloc = std::unique_ptr<T, MallocFreer>;
-
-class UniqueFd {
-  public:
-    explicit UniqueFd(int fd = -1) : Fd(fd) {}
-    ~UniqueFd() { Reset(); }
-    UniqueFd(UniqueFd&& other) noexcept : Fd(std::exchange(other.Fd, -1)) {}
-    UniqueFd& operator=(UniqueFd&& other) noexcept {
-        if (this != &other) {
-            Reset(std::exchange(other.Fd, -1));
-        }
-        return *this;
-    }
-    UniqueFd(const UniqueFd&) = delete;
-    UniqueFd& operator=(const UniqueFd&) = delete;
-
-    int Get() const { return Fd; }
-    explicit operator bool() const { return Fd >= 0; }
-    void Reset(int fd = -1) {
-        if (Fd >= 0) {
-            close(Fd);
-        }
-        Fd = fd;
-    }
-
-  private:
-    int Fd;
-};
+#include "../include/filehandle.h"
