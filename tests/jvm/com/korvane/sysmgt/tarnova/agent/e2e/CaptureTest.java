@@ -46,7 +46,7 @@ class CaptureTest {
 
     @Test
     void aSimulatedMachineComesBackWithItsFunctionsDriverAndInventories() throws Exception {
-        Path sample = AgentHarness.sampleMachine("x440-chassis-drawer");
+        Path sample = AgentHarness.sampleMachine("chassis-drawer");
         Path copy = Files.createDirectory(temp.resolve("copy"));
         Path run = temp.resolve("run");
         capture(copy, buildDir + "/sim/velhsim", "--machine", sample.toString(), "--run-dir",
@@ -59,11 +59,11 @@ class CaptureTest {
                 assertEquals(-1L, Files.mismatch(file, captured), file::toString);
             }
         }
-        // The sample's modules are not captured here, so only the status may differ.
-        Map<String, Object> original = json(sample);
-        Map<String, Object> replayed = json(copy);
-        for (String kind : List.of("systems", "busses", "slots", "adapters")) {
-            assertEquals(original.get(kind), replayed.get(kind), kind);
+        // Under the simulator the modules are seen by query_module only, and the install folder
+        // is no part of a capture: with both, the replay is the sample.
+        for (String part : List.of("install", "modules")) {
+            AgentHarness.copyTree(sample.resolve(part), copy.resolve(part));
         }
+        assertEquals(json(sample), json(copy));
     }
 }

@@ -24,7 +24,7 @@ class MachineTest {
 
     private AgentHarness harness() {
         Path machines = Path.of(AgentHarness.property("velh.machines.dir"));
-        return new AgentHarness(temp).onMachine(machines.resolve("x440-chassis-drawer"));
+        return new AgentHarness(temp).onMachine(machines.resolve("chassis-drawer"));
     }
 
     @Test
