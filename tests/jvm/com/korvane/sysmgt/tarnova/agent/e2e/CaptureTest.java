@@ -60,12 +60,21 @@ class CaptureTest {
                 assertEquals(-1L, Files.mismatch(file, captured), file::toString);
             }
         }
-        // The modules of the sample are not the build machine's, so only the status may differ.
+        // The modules of the sample are not the build machine's, so only the status and the
+        // driver files named by the modules' load-time markers may differ.
         Map<String, Object> original = json(sample);
         Map<String, Object> replayed = json(copy);
         for (String kind : List.of("systems", "busses", "slots", "adapters")) {
-            assertEquals(original.get(kind), replayed.get(kind), kind);
+            assertEquals(withoutDrivers(original.get(kind)), withoutDrivers(replayed.get(kind)), kind);
         }
+    }
+
+    @SuppressWarnings("unchecked")
+    private static Object withoutDrivers(Object elements) {
+        for (Object element : (List<Object>) elements) {
+            ((Map<String, Object>) element).remove("Driver");
+        }
+        return elements;
     }
 
     private static String read(Path file) {
