@@ -4,6 +4,7 @@
 
 #include "asl.h"
 #include "diag/hwdebug.h"
+#include "diag/hwdump.h"
 #include "hw/aslstore.h"
 #include "hwobjects.h"
 #include "setup/linsetup.h"
@@ -24,6 +25,25 @@ void EmptyLists() {
     BusList.DestroyAll();
     SlotList.DestroyAll();
     AdapterList.DestroyAll();
+}
+
+// The dumps the debug level asks for once the lists are complete.
+void DumpResults() {
+    if ((HwInfoPrintLevel & DUMP_AGENT_STATS) != 0) {
+        DumpAgentStats(&AgentStatistics, L"After hardware collection");
+    }
+    if ((HwInfoPrintLevel & DUMP_SYSTEMS) != 0) {
+        DumpSystems();
+    }
+    if ((HwInfoPrintLevel & DUMP_BUSSES) != 0) {
+        DumpBusses();
+    }
+    if ((HwInfoPrintLevel & DUMP_SLOTS) != 0) {
+        DumpSlots();
+    }
+    if ((HwInfoPrintLevel & DUMP_ADAPTERS) != 0) {
+        DumpAdapters();
+    }
 }
 
 }  // namespace
@@ -62,10 +82,18 @@ bool GetHwInfo() {
         TraceAcquire("GetHwInfo():  using PCI architecture ASL\n");
     }
 
+    if ((HwInfoPrintLevel & RAW_ASL) != 0) {
+        DumpRawAslPacket(packet.get(), size);
+    }
+    if ((HwInfoPrintLevel & COOKED_ASL) != 0) {
+        DumpAslPacket(packet.get(), size);
+    }
+
     TraceAcquire("GetHwInfo():  storing PCI architecture table\n");
     StoreAslTable(packet.get(), size);
 
     TraceAcquire("GetHwInfo():  hardware info acquired\n");
+    DumpResults();
     StopHwInfo();
     return true;
 }
