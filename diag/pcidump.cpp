@@ -1,4 +1,5 @@
 // Dumps of a PCI configuration image by its header type, with its capability list.
+#include "adapters/cfgspace.h"
 #include "diag/dumpfields.h"
 #include "diag/hwdebug.h"
 #include "diag/hwdump.h"
@@ -160,5 +161,17 @@ const wchar_t* CapabilityStr(const CAP_ITEM_HEADER* item) {
 }
 
 void DumpCapabilityList(const _PCI_CONFIG0* config) {
-    (void)config;
+    if ((config->Status & PCI_STATUS_CAP_LIST) == 0) {
+        return;
+    }
+    // The shared walk stops a looping list and an item that would reach past the image.
+    ForEachCapability(config, [config](uint8_t offset, const CAP_ITEM_HEADER* item) {
+        dbgprint("Capability List Item at 0x%02x:  %s\n", offset, CapabilityStr(item));
+        dbgprint("\n");
+        const auto length = static_cast<uint32_t>(CapabilityLen(item));
+        DumpByteBuffer(reinterpret_cast<const char*>(config), length, offset, length);
+        dbgprint("\n");
+        dbgprint("\n");
+        return true;
+    });
 }

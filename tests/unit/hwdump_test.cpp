@@ -2,6 +2,7 @@
 
 #include <gtest/gtest.h>
 
+#include <cstring>
 #include <string>
 #include <vector>
 
@@ -21,7 +22,6 @@ class HwDumpTest : public ::testing::Test {
 
 TEST_F(HwDumpTest, HexDumpLinesKeepTheirWidth) {
     const std::string bytes = std::string("ABCDEFGHIJKLMNO\x7f~ 0123456789abcd") + '\0';
-    const std::string config = std::string(0x50, 'x') + "\x07" + std::string(1, '\0') + "ABCDEF";
     struct Case {
         const std::string& Buffer;
         uint32_t Length, Start, PerLine;
@@ -33,8 +33,8 @@ TEST_F(HwDumpTest, HexDumpLinesKeepTheirWidth) {
          " 00000010:  7e 20 30 31 32 33 34 35 - 36 37 38 39 61 62 63 64  ~ 012345 6789abcd\r\n"
          " 00000020:  00" +
              std::string(49, ' ') + "." + std::string(16, ' ') + "\r\n"},
-        // A capability item: one line from its own offset, n bytes wide.
-        {config, 8, 0x50, 8, " 00000050:  07 00 41 42 - 43 44 45 46  ..AB CDEF\r\n"},
+        // A start inside the buffer: its offset shows; 4 a line puts "- " before the third.
+        {bytes, 3, 30, 4, " 0000001e:  63 64 - 00     cd . \r\n"},
         {bytes, 0, 0, 16, ""},
     };
     for (const Case& c : cases) {
@@ -94,5 +94,40 @@ TEST_F(HwDumpTest, DecodedPacketEndsWhereTheWalkEnds) {
         for (const std::string& expected : c.Expected) {
             EXPECT_NE(log.find(expected), std::string::npos) << expected << "\n" << log;
         }
+    }
+}
+
+TEST_F(HwDumpTest, CapabilityListIsBoundedAndNamed) {
+    struct Case {
+        uint8_t Status, First, Id, Next;
+        std::string Expected;
+        size_t Items;
+    };
+    const std::vector<Case> cases = {
+        {0x10, 0x53, 7, 0x00,
+         "Capability List Item at 0x50:  PCI-X\n\n"
+         " 00000050:  07 00 41 42 - 43 44 45 46  ..AB CDEF\r\n\n\n",
+         1},
+        // A list that points back at itself ends after the items that fit in the image.
+        {0x10, 0x50, 1, 0x50, "Capability List Item at 0x50:  Power Management Interface\n", 48},
+        {0x10, 0x50, 0x09, 0x00, "Capability List Item at 0x50:  Not Recognized\n\n\n\n", 1},
+        {0x00, 0x50, 7, 0x00, "", 0},
+    };
+    for (const Case& c : cases) {
+        std::remove("../log/velhslot.slotmgr.hwinfo.log");
+        _PCI_CONFIG0 config{};
+        config.Status = c.Status;
+        config.CapabilitiesPtr = c.First;
+        const uint8_t item[] = {c.Id, c.Next, 'A', 'B', 'C', 'D', 'E', 'F'};
+        std::memcpy(config.DeviceSpecific + 0x10, item, sizeof(item));
+        DumpCapabilityList(&config);
+        const std::string log = Tree.Log();
+        EXPECT_EQ(log.find(c.Expected), 0u) << log;
+        size_t items = 0;
+        for (size_t at = log.find("Capability List"); at != std::string::npos;
+             at = log.find("Capability List", at + 1)) {
+            items++;
+        }
+        EXPECT_EQ(items, c.Items);
     }
 }
