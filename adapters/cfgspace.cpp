@@ -8,8 +8,8 @@
 #include <cstring>
 #include <cwchar>
 
+#include "adapters/adapterdump.h"
 #include "diag/hwdebug.h"
-#include "diag/hwdump.h"
 #include "util/filehandle.h"
 
 namespace {

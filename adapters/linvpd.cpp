@@ -9,7 +9,7 @@
 #include <new>
 
 #include "diag/hwdebug.h"
-#include "util/filehandle.h"
+#include "filehandle.h"
 #include "util/sysaccess.h"
 
 _VPD_LAYOUT Vpd;

@@ -5,7 +5,7 @@
 #include <climits>
 #include <cstddef>
 
-#include "util/filehandle.h"
+#include "filehandle.h"
 
 constexpr int QM_SYMBOLS = 4;
 constexpr int QM_INFO = 5;

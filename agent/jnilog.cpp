@@ -4,7 +4,7 @@
 #include <cstdint>
 #include <cstdio>
 
-#include "util/filehandle.h"
+#include "filehandle.h"
 
 namespace {
 

@@ -7,7 +7,7 @@
 
 #include "diag/linport.h"
 #include "diag/progname.h"
-#include "util/filehandle.h"
+#include "filehandle.h"
 
 uint32_t HwInfoPrintLevel = 0;
 int32_t EnterExitIndent = 0;

@@ -12,13 +12,11 @@
 constexpr size_t WIDE_BUFFER_CHARS = 1024;
 
 constexpr const char* HWINFO_LOG_PATH = "../log/velhslot.slotmgr.hwinfo.log";
-constexpr const char* DEBUG_LEVEL_FILE = "dbgprint";
 
 extern int32_t EnterExitIndent;
 // Shared scratch buffer for widening one narrow argument of a trace or error call.
 extern wchar_t WideBuffer[WIDE_BUFFER_CHARS];
 
-void GetDebugPrintLevel(int showHelp);
 void ResetDebugOut();
 
 void dbgprint(const char* format, ...);

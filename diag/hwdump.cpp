@@ -5,7 +5,6 @@
 #include "diag/dumpfields.h"
 #include "diag/hwdebug.h"
 #include "diag/linport.h"
-#include "setup/linsetup.h"
 
 namespace {
 
@@ -41,6 +40,16 @@ std::string HexDumpLine(const unsigned char* bytes, uint32_t count, uint32_t off
     return line.append("\r\n");
 }
 
+template <typename T>
+void DumpList(ObjListTemp<T>& list, void (*dump)(const T*)) {
+    list.BeginEnumeration();
+    while (const T* object = list.Next()) {
+        dump(object);
+    }
+}
+
+}  // namespace
+
 void ObjectHeading(const char* kind, const void* object) {
     dbgprint("\n");
     dbgprint(kind);
@@ -51,31 +60,6 @@ void ObjectHeading(const char* kind, const void* object) {
     }
     dbgprint("\n");
 }
-
-template <typename T>
-void DumpList(ObjListTemp<T>& list, void (*dump)(const T*)) {
-    list.BeginEnumeration();
-    while (const T* object = list.Next()) {
-        dump(object);
-    }
-}
-
-bool ShowAdapter(const AdapterDescriptor* adapter) {
-    const uint32_t bit = adapter->OnBoard ? DUMP_ONBOARD_ADAPTERS : DUMP_SLOT_ADAPTERS;
-    return (HwInfoPrintLevel & bit) != 0;
-}
-
-void DumpAdapterList(const char* title, ObjListTemp<AdapterDescriptor>& list) {
-    DumpTitle(title);
-    list.BeginEnumeration();
-    while (const AdapterDescriptor* adapter = list.Next()) {
-        if (ShowAdapter(adapter)) {
-            DumpAdapter(adapter);
-        }
-    }
-}
-
-}  // namespace
 
 void DumpByteBuffer(const char* buffer, uint32_t length, uint32_t start, uint32_t perLine) {
     if (buffer == nullptr || perLine == 0) {
@@ -150,35 +134,6 @@ void DumpSlot(const SlotDescriptor* slot) {
     dbgprint("\n");
 }
 
-void DumpAdapter(const AdapterDescriptor* adapter) {
-    const FieldWriter field(15, ":  ", "0x%02x  (%d)");
-    ObjectHeading("Adapter Object", adapter);
-    field.Number("AdapterID", adapter->AdapterID, "%d");
-    dbgprint("\n");
-    field.Number("FriendlyNum", adapter->FriendlyNum);
-    field.Number("SlotID", adapter->SlotID);
-    field.Number("BusID", adapter->BusID);
-    field.Number("MaxSpeed", adapter->MaxSpeed);
-    field.Number("PowerReq", adapter->PowerReq);
-    field.Number("Width", adapter->Width);
-    field.Number("Bus", adapter->Bus);
-    field.Number("Device", adapter->Device);
-    field.Number("Function", adapter->Function);
-    field.Flag("HasBridge", adapter->HasBridge);
-    field.Flag("IsBootDev", adapter->IsBootDev);
-    field.Flag("SupPciX", adapter->SupPciX);
-    field.Flag("OnBoard", adapter->OnBoard);
-    field.Text("Name", adapter->Name.c_str());
-    field.Text("PciId", adapter->PciId.c_str());
-    field.Text("Driver", adapter->Driver.c_str());
-    wchar_t module[WIDE_BUFFER_CHARS];
-    field.Text("ModuleName", MakeWideString(adapter->ModuleName.get(), module));
-    dbgprint("\n");
-    if ((HwInfoPrintLevel & DUMP_ADAPTER_CFG_SPACE) != 0) {
-        DumpPciConfigSpace(reinterpret_cast<const _PCI_CONFIG0*>(adapter->ConfigSpace), 0);
-    }
-}
-
 void DumpSystems() {
     DumpList(SystemList, DumpSystem);
 }
@@ -189,11 +144,6 @@ void DumpBusses() {
 
 void DumpSlots() {
     DumpList(SlotList, DumpSlot);
-}
-
-void DumpAdapters() {
-    DumpAdapterList("Real Adapters\n", AdapterList);
-    DumpAdapterList("Simulated Adapters\n", FileAdapters);
 }
 
 void DumpAgentStats(const _AgentStats* stats, const wchar_t* title) {

@@ -9,7 +9,7 @@
 #include <cwctype>
 
 #include "diag/hwdebug.h"
-#include "util/filehandle.h"
+#include "filehandle.h"
 
 void* (*MessageAlloc)(size_t bytes) = std::malloc;
 

@@ -12,10 +12,10 @@
 
 #include "asl.h"
 #include "dbglevel.h"
-#include "diag/hwdump.h"
 #include "fuzz/fuzzsupport.h"
 #include "hw/aslstore.h"
 #include "hwobjects.h"
+#include "sources/asldump.h"
 
 namespace {
 

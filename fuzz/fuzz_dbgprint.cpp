@@ -11,6 +11,7 @@
 #include "dbglevel.h"
 #include "diag/hwdebug.h"
 #include "fuzz/fuzzsupport.h"
+#include "util/debuglevel.h"
 
 namespace {
 

@@ -1,7 +1,7 @@
 #include "hw/adapterxref.h"
 
+#include "adapters/adapterdump.h"
 #include "diag/hwdebug.h"
-#include "diag/hwdump.h"
 
 namespace {
 

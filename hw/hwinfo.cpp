@@ -2,14 +2,17 @@
 
 #include <memory>
 
+#include "adapters/adapterdump.h"
 #include "asl.h"
 #include "diag/hwdebug.h"
 #include "diag/hwdump.h"
 #include "hw/aslstore.h"
 #include "hwobjects.h"
 #include "setup/linsetup.h"
+#include "sources/asldump.h"
 #include "sources/filetabl.h"
 #include "sources/linhw.h"
+#include "util/debuglevel.h"
 
 namespace {
 

@@ -12,11 +12,11 @@
 #include "asl.h"
 #include "diag/hwdebug.h"
 #include "diag/hwdump.h"
+#include "filehandle.h"
 #include "sources/linhw.h"
+#include "sources/pcifile.h"
 #include "util/enumdir.h"
-#include "util/filehandle.h"
 #include "util/parstool.h"
-#include "util/pcifile.h"
 #include "util/sysaccess.h"
 
 _AgentStats AgentStatistics;

@@ -6,10 +6,10 @@
 
 #include "diag/hwdebug.h"
 #include "diag/linport.h"
-#include "util/filehandle.h"
+#include "filehandle.h"
+#include "sources/pcifile.h"
 #include "util/instdir.h"
 #include "util/parstool.h"
-#include "util/pcifile.h"
 
 namespace {
 

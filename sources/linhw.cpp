@@ -12,7 +12,7 @@
 
 #include "diag/hwdebug.h"
 #include "diag/progname.h"
-#include "util/filehandle.h"
+#include "filehandle.h"
 #include "util/sysaccess.h"
 #include "velhpdrv.h"
 

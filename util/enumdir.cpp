@@ -8,7 +8,7 @@
 #include <cstring>
 
 #include "diag/hwdebug.h"
-#include "util/filehandle.h"
+#include "filehandle.h"
 
 namespace {
 

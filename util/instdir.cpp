@@ -7,7 +7,7 @@
 #include <cwchar>
 
 #include "diag/hwdebug.h"
-#include "util/filehandle.h"
+#include "filehandle.h"
 
 bool GetInstallDir(wchar_t* buffer, int32_t size) {
     if (buffer == nullptr) {

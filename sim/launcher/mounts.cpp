@@ -15,8 +15,8 @@
 #include <utility>
 #include <vector>
 
+#include "filehandle.h"
 #include "sim/common/textfile.h"
-#include "util/filehandle.h"
 
 namespace velhsim {
 

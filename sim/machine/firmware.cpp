@@ -8,8 +8,8 @@
 #include <cstring>
 #include <filesystem>
 
+#include "filehandle.h"
 #include "sim/common/textfile.h"
-#include "util/filehandle.h"
 
 namespace velhsim {
 

@@ -23,7 +23,7 @@
 #include <string>
 #include <vector>
 
-#include "util/filehandle.h"
+#include "filehandle.h"
 #include "velhpdrv.h"
 
 namespace {

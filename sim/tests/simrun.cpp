@@ -10,9 +10,9 @@
 #include <stdexcept>
 #include <system_error>
 
+#include "filehandle.h"
 #include "sim/common/textfile.h"
 #include "sim/launcher/process.h"
-#include "util/filehandle.h"
 
 namespace velhsim::test {
 

@@ -24,8 +24,8 @@
 
 #include "asl.h"
 #include "diag/hwdebug.h"
+#include "filehandle.h"
 #include "sources/filetabl.h"
-#include "util/filehandle.h"
 
 namespace {
 

@@ -14,6 +14,7 @@
 #include "diag/linport.h"
 #include "diag/progname.h"
 #include "scratchdir.h"
+#include "util/debuglevel.h"
 
 namespace {
 

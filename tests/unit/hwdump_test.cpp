@@ -1,4 +1,6 @@
 #include "diag/hwdump.h"
+#include "adapters/adapterdump.h"
+#include "sources/asldump.h"
 
 #include <gtest/gtest.h>
 

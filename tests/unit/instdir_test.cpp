@@ -8,8 +8,9 @@
 #include <vector>
 
 #include "diag/hwdebug.h"
+#include "filehandle.h"
 #include "scratchdir.h"
-#include "util/filehandle.h"
+#include "util/debuglevel.h"
 #include "util/instdir.h"
 
 namespace {

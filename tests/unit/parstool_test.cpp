@@ -5,8 +5,8 @@
 #include <string>
 #include <vector>
 
+#include "filehandle.h"
 #include "scratchdir.h"
-#include "util/filehandle.h"
 #include "util/parstool.h"
 
 namespace {

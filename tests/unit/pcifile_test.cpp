@@ -1,4 +1,4 @@
-#include "util/pcifile.h"
+#include "sources/pcifile.h"
 
 #include <gtest/gtest.h>
 #include <sys/stat.h>

@@ -1,4 +1,5 @@
-// Dumps of the ASL packet: raw bytes, and decoded along the same bounded walk as the storing.
+#include "sources/asldump.h"
+
 #include <algorithm>
 #include <cstring>
 

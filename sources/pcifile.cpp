@@ -1,9 +1,9 @@
-#include "util/pcifile.h"
+#include "sources/pcifile.h"
 
 #include <cstring>
 
 #include "adapters/linvpd.h"
-#include "util/filehandle.h"
+#include "filehandle.h"
 #include "util/instdir.h"
 
 namespace {

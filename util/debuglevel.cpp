@@ -1,10 +1,12 @@
 // The debug level: read from the level file at the start of an acquisition, with its help block.
+#include "util/debuglevel.h"
+
 #include <cstdio>
 #include <cstring>
 
 #include "diag/hwdebug.h"
 #include "diag/linport.h"
-#include "util/filehandle.h"
+#include "filehandle.h"
 #include "util/instdir.h"
 #include "util/parstool.h"
 

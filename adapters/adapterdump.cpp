@@ -1,10 +1,26 @@
-// Dumps of a PCI configuration image by its header type, with its capability list.
+#include "adapters/adapterdump.h"
+
 #include "adapters/cfgspace.h"
 #include "diag/dumpfields.h"
 #include "diag/hwdebug.h"
 #include "diag/hwdump.h"
 
 namespace {
+
+bool ShowAdapter(const AdapterDescriptor* adapter) {
+    const uint32_t bit = adapter->OnBoard ? DUMP_ONBOARD_ADAPTERS : DUMP_SLOT_ADAPTERS;
+    return (HwInfoPrintLevel & bit) != 0;
+}
+
+void DumpAdapterList(const char* title, ObjListTemp<AdapterDescriptor>& list) {
+    DumpTitle(title);
+    list.BeginEnumeration();
+    while (const AdapterDescriptor* adapter = list.Next()) {
+        if (ShowAdapter(adapter)) {
+            DumpAdapter(adapter);
+        }
+    }
+}
 
 const char* const FORM8 = "0x%02x";
 const char* const FORM16 = "0x%04x";
@@ -38,6 +54,40 @@ void DumpDeviceSpecific(const void* config, int full) {
 }
 
 }  // namespace
+
+void DumpAdapter(const AdapterDescriptor* adapter) {
+    const FieldWriter field(15, ":  ", "0x%02x  (%d)");
+    ObjectHeading("Adapter Object", adapter);
+    field.Number("AdapterID", adapter->AdapterID, "%d");
+    dbgprint("\n");
+    field.Number("FriendlyNum", adapter->FriendlyNum);
+    field.Number("SlotID", adapter->SlotID);
+    field.Number("BusID", adapter->BusID);
+    field.Number("MaxSpeed", adapter->MaxSpeed);
+    field.Number("PowerReq", adapter->PowerReq);
+    field.Number("Width", adapter->Width);
+    field.Number("Bus", adapter->Bus);
+    field.Number("Device", adapter->Device);
+    field.Number("Function", adapter->Function);
+    field.Flag("HasBridge", adapter->HasBridge);
+    field.Flag("IsBootDev", adapter->IsBootDev);
+    field.Flag("SupPciX", adapter->SupPciX);
+    field.Flag("OnBoard", adapter->OnBoard);
+    field.Text("Name", adapter->Name.c_str());
+    field.Text("PciId", adapter->PciId.c_str());
+    field.Text("Driver", adapter->Driver.c_str());
+    wchar_t module[WIDE_BUFFER_CHARS];
+    field.Text("ModuleName", MakeWideString(adapter->ModuleName.get(), module));
+    dbgprint("\n");
+    if ((HwInfoPrintLevel & DUMP_ADAPTER_CFG_SPACE) != 0) {
+        DumpPciConfigSpace(reinterpret_cast<const _PCI_CONFIG0*>(adapter->ConfigSpace), 0);
+    }
+}
+
+void DumpAdapters() {
+    DumpAdapterList("Real Adapters\n", AdapterList);
+    DumpAdapterList("Simulated Adapters\n", FileAdapters);
+}
 
 void DumpPciConfigSpace0(const _PCI_CONFIG0* config, int full) {
     const FieldWriter field(20, ":  ", FORM8);
