@@ -10,7 +10,7 @@
 
 #include "adapters/adapterdump.h"
 #include "diag/hwdebug.h"
-#include "util/filehandle.h"
+#include "filehandle.h"
 
 namespace {
 
@@ -110,9 +110,7 @@ int GetPciConfig(const char* path, int offset, int size, char* out) {
         const bool whole = WalkCapabilityList(image.CapabilitiesPtr, [&](uint8_t at) {
             int read = 0;
             const uint8_t next = ReadCapabilityItem(file.Get(), at, bytes + at, &read);
-            if (read > 0) {
-                length = std::max(length, at + read);
-            }
+            length = std::max(length, at + read);
             return next;
         });
         if (!whole) {

@@ -22,22 +22,33 @@ std::string ResolvePart(const std::string& part, const std::string& origin,
     return JoinPath(origin, part);
 }
 
-std::string ResolveList(const std::string& list, const std::string& origin,
-                        const std::string& install) {
-    std::string resolved;
+// The parts of an argument: itself, or the text after its first "=", split at ":".
+std::vector<std::string> Parts(const std::string& argument) {
+    const size_t equals = argument.find('=');
+    const std::string list = equals == std::string::npos ? argument : argument.substr(equals + 1);
+    std::vector<std::string> parts;
     size_t start = 0;
-    for (;;) {
-        const size_t colon = list.find(':', start);
-        resolved += ResolvePart(list.substr(start, colon - start), origin, install);
-        if (colon == std::string::npos) {
-            return resolved;
-        }
-        resolved += ':';
+    for (size_t colon = list.find(':'); colon != std::string::npos; colon = list.find(':', start)) {
+        parts.push_back(list.substr(start, colon - start));
         start = colon + 1;
     }
+    parts.push_back(list.substr(start));
+    return parts;
 }
 
 }  // namespace
+
+std::vector<std::string> ExistingAbsolutePaths(const std::vector<std::string>& command) {
+    std::vector<std::string> paths;
+    for (const std::string& argument : command) {
+        for (const std::string& part : Parts(argument)) {
+            if (!part.empty() && part.front() == '/' && Exists(part)) {
+                paths.push_back(part);
+            }
+        }
+    }
+    return paths;
+}
 
 std::vector<std::string> ResolveArguments(const std::vector<std::string>& command,
                                           const std::string& origin, const std::string& install) {
@@ -49,12 +60,12 @@ std::vector<std::string> ResolveArguments(const std::vector<std::string>& comman
             continue;
         }
         const size_t equals = argument.find('=');
-        if (equals != std::string::npos) {
-            resolved.push_back(argument.substr(0, equals + 1) +
-                               ResolveList(argument.substr(equals + 1), origin, install));
-        } else {
-            resolved.push_back(ResolveList(argument, origin, install));
+        std::string joined = equals == std::string::npos ? "" : argument.substr(0, equals + 1);
+        const std::vector<std::string> parts = Parts(argument);
+        for (size_t p = 0; p < parts.size(); ++p) {
+            joined += (p > 0 ? ":" : "") + ResolvePart(parts[p], origin, install);
         }
+        resolved.push_back(joined);
     }
     return resolved;
 }

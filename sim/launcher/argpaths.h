@@ -14,4 +14,7 @@ namespace velhsim {
 std::vector<std::string> ResolveArguments(const std::vector<std::string>& command,
                                           const std::string& origin, const std::string& install);
 
+// The parts of the arguments (as above) that name existing paths by absolute paths.
+std::vector<std::string> ExistingAbsolutePaths(const std::vector<std::string>& command);
+
 }  // namespace velhsim

@@ -158,7 +158,10 @@ int Run(const Options& options) {
             return SuperviseNamespace(first);
         }
     }
-    if (!ShowMachine(run, processNamespace, &error)) {
+    // What the command names stays reachable when /tmp and /var/tmp become the run's own.
+    std::vector<std::string> reachable = ExistingAbsolutePaths(command);
+    reachable.insert(reachable.end(), {run, origin, machine, toolDir});
+    if (!ShowMachine(run, reachable, processNamespace, &error)) {
         return Fail(error);
     }
     if (chdir(install.c_str()) != 0) {

@@ -11,7 +11,9 @@
 #include <cerrno>
 #include <cstdio>
 #include <cstring>
+#include <filesystem>
 #include <memory>
+#include <system_error>
 #include <utility>
 #include <vector>
 
@@ -228,16 +230,84 @@ bool Overlay(const std::string& source, const std::string& target, std::string* 
     return true;
 }
 
+// The folders whose files every program of a machine shares; each run gets its own.
+const char* const TEMPORARY_FOLDERS[] = {"/tmp", "/var/tmp"};
+
+bool InTemporaryFolder(const std::string& path) {
+    return std::any_of(std::begin(TEMPORARY_FOLDERS), std::end(TEMPORARY_FOLDERS),
+                       [&](const char* dir) { return IsBelow(path, dir); });
+}
+
+// Binds RUN/tmp and RUN/var/tmp over /tmp and /var/tmp, so that runs side by side share no
+// temporary file (a JVM's perf data file is named after its process number, the same in every
+// run). The folders of `reachable` that lay in them are bound back at their paths.
+bool PrivateTemporaryFolders(const std::string& run, const std::vector<std::string>& reachable,
+                             std::string* error) {
+    std::vector<std::string> paths;
+    for (const std::string& path : reachable) {
+        std::error_code code;
+        std::filesystem::path real = std::filesystem::weakly_canonical(path, code);
+        // A file is shown with its folder.
+        if (!code && !IsDirectory(real.string())) {
+            real = real.parent_path();
+        }
+        if (!code && InTemporaryFolder(real.string())) {
+            paths.push_back(real.string());
+        }
+    }
+    // Shortest first, and none inside another: binding the outer brings the inner along.
+    std::sort(paths.begin(), paths.end());
+    std::vector<std::pair<std::string, UniqueFd>> kept;
+    for (const std::string& path : paths) {
+        if (std::none_of(kept.begin(), kept.end(), [&](const auto& outer) {
+                return path == outer.first || IsBelow(path, outer.first);
+            })) {
+            UniqueFd fd(open(path.c_str(), O_PATH | O_CLOEXEC));
+            if (!fd) {
+                return Failed(error, "cannot open " + path);
+            }
+            kept.emplace_back(path, std::move(fd));
+        }
+    }
+    // The run's own folders are opened first: the run itself may lie in /tmp.
+    std::vector<std::pair<const char*, UniqueFd>> own;
+    for (const char* dir : TEMPORARY_FOLDERS) {
+        const std::string path = JoinPath(run, dir + 1);
+        std::error_code code;
+        std::filesystem::create_directories(path, code);
+        UniqueFd fd(open(path.c_str(), O_PATH | O_DIRECTORY | O_CLOEXEC));
+        if (code || chmod(path.c_str(), 01777) != 0 || !fd) {
+            return Failed(error, "cannot make " + path);
+        }
+        own.emplace_back(dir, std::move(fd));
+    }
+    for (const auto& [dir, fd] : own) {
+        if (IsDirectory(dir) && !Bind(DescriptorPath(fd.Get()), dir, error)) {
+            return false;
+        }
+    }
+    for (const auto& [path, fd] : kept) {
+        std::error_code code;
+        std::filesystem::create_directories(path, code);
+        if (code || !Bind(DescriptorPath(fd.Get()), path, error)) {
+            return Failed(error, "cannot show " + path + " in the run's temporary folder");
+        }
+    }
+    return true;
+}
+
 }  // namespace
 
-bool ShowMachine(const std::string& run, bool ownProc, std::string* error) {
+bool ShowMachine(const std::string& run, const std::vector<std::string>& reachable, bool ownProc,
+                 std::string* error) {
     if (ownProc && mount("proc", "/proc", "proc", MS_NOSUID | MS_NODEV | MS_NOEXEC, nullptr) != 0) {
         return Failed(error, "cannot mount /proc");
     }
     return LayOverEntries(JoinPath(run, "proc/bus"), "/proc/bus", error) &&
            Overlay(JoinPath(run, "etc"), "/etc", error) &&
            Overlay(JoinPath(run, "usr/share"), "/usr/share", error) &&
-           LayOverEntries(JoinPath(run, "dev"), "/dev", error);
+           LayOverEntries(JoinPath(run, "dev"), "/dev", error) &&
+           PrivateTemporaryFolders(run, reachable, error);
 }
 
 }  // namespace velhsim

@@ -62,7 +62,7 @@ TEST(VelhsimMachine, ShowsTheMachinesFilesOverTheSystem) {
               "64\n20\n"
               "1048576\n"
               " 252   U   V   P   D\n"
-              "   8   8   7   0   4   R   X\n"
+              "   K   7   4   0   C   4   D\n"
               "null works\n" +
                   run + "/install\nlog beside\n");
 }

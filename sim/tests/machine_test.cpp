@@ -131,15 +131,15 @@ TEST(PciTree, WritesBusFoldersFunctionFilesAndDevices) {
 
 TEST(Firmware, EncodesTheRecordWithPaddedTextsAndAChecksum) {
     FirmwareRecord record;
-    record.Type = "8870";
-    record.Model = "4R";
-    record.BuildId = "RYE135AUS";
-    record.Serial = "78KA123";
+    record.Type = "K740";
+    record.Model = "C4";
+    record.BuildId = "KVD140AKV";
+    record.Serial = "K7D0412";
     record.UniqueId = "2303A4B5C6D";
     const std::string bytes = EncodeVpdRecord(record);
     ASSERT_EQ(bytes.size(), 48u);
     EXPECT_EQ(bytes.substr(0, 6), std::string("\xaa\x55VPD\x30"));
-    EXPECT_EQ(bytes.substr(13, 34), "RYE135AUS78KA1232303A4B5C6D88704R ");
+    EXPECT_EQ(bytes.substr(13, 34), "KVD140AKVK7D04122303A4B5C6DK740C4 ");
     unsigned sum = 0;
     for (unsigned char byte : bytes) {
         sum += byte;
@@ -164,8 +164,8 @@ TEST(Firmware, BuildsASparseImageWithTheSegmentAtF0000) {
               "# two records and a captured segment\n"
               "segment bios.bin\n"
               "record 0x100\n"
-              "type 8870 # the machine type\n"
-              "model \"4R \"\n"
+              "type K740 # the machine type\n"
+              "model \"C4 \"\n"
               "record 0xFFE0  // the last one is cut at the segment's end\n"
               "type 1234\n");
     std::string error;
@@ -174,14 +174,14 @@ TEST(Firmware, BuildsASparseImageWithTheSegmentAtF0000) {
     EXPECT_THAT(error, HasSubstr("line 6: the record's offset must be a number"));
 
     dir.Write("firmware",
-              "segment bios.bin\nrecord 0x100\ntype 8870 # the machine type\nmodel \"4R \"\n"
+              "segment bios.bin\nrecord 0x100\ntype K740 # the machine type\nmodel \"C4 \"\n"
               "record 0xFFE0\ntype 1234\n");
     ASSERT_TRUE(BuildMemoryImage(dir / "firmware", dir / "mem", &error)) << error;
     const std::string image = FileText(dir / "mem");
     ASSERT_EQ(image.size(), MEMORY_IMAGE_SIZE);
     EXPECT_EQ(image[0xF0000], 'S');
     EXPECT_EQ(image.substr(0xF0100, 5), "\xaa\x55VPD");
-    EXPECT_EQ(image.substr(0xF0100 + 40, 7), "88704R ");
+    EXPECT_EQ(image.substr(0xF0100 + 40, 7), "K740C4 ");
     EXPECT_EQ(image.substr(0xFFFE0, 5), "\xaa\x55VPD");
     EXPECT_EQ(image.substr(0xFFFE0 + 13, 19), std::string(19, ' '));
     EXPECT_EQ(image[0xEFFFF], '\0');
@@ -196,10 +196,10 @@ TEST(Firmware, RefusesDescriptionsItCannotHonour) {
         std::string Message;
     };
     const std::vector<Case> cases = {
-        {"type 8870\n", "line 1: \"type\" before the first \"record\" line"},
+        {"type K740\n", "line 1: \"type\" before the first \"record\" line"},
         {"record 0x10000\n", "line 1: the record's offset must be a number below"},
-        {"record 0\ntype 88701\n", "line 2: type has at most 4 characters"},
-        {"record 0\nmodel \"4RX\n", "line 2: unbalanced quote"},
+        {"record 0\ntype K7401\n", "line 2: type has at most 4 characters"},
+        {"record 0\nmodel \"C4D\n", "line 2: unbalanced quote"},
         {"record 0\nlength 256\n", "line 2: length must be a number from 0 to 255"},
         {"record 0\ncolour red\n", "line 2: unknown key \"colour\""},
     };

@@ -55,10 +55,10 @@ TEST(SampleMachine, OffersEveryPartOfTheDescribedServer) {
                   "info d0800000 5000 1 0\n"
                   "release 2.4.19-64GB-SMP\n"
                   "SuSE SLES-8 (i386)\n"
-                  "INITRD_MODULES=\"ips aic7xxx reiserfs\"\n"
-                  "00 01 02 03 04 05 10 11 devices\n"
-                  "24\n"
-                  "   8   8   7   0   4   R   X\n"
+                  "INITRD_MODULES=\"megaraid aic7xxx reiserfs\"\n"
+                  "00 01 02 03 04 05 06 10 11 devices\n"
+                  "28\n"
+                  "   K   7   4   0   C   4   D\n"
                   "dbgprint\nvelhadp.crd\n");
 }
 
@@ -105,7 +105,7 @@ std::set<std::string> ExpectNamedDevicesAndLoadedDrivers(const std::string& mach
 }
 
 TEST(SampleMachine, HasAModuleForEveryBoundDriverAndNamesItsDevices) {
-    EXPECT_EQ(ExpectNamedDevicesAndLoadedDrivers(SAMPLE).size(), 9u);
+    EXPECT_EQ(ExpectNamedDevicesAndLoadedDrivers(SAMPLE).size(), 10u);
     EXPECT_THAT(FileText(SAMPLE + "/modules/e1000/symbols"),
                 HasSubstr("__insmod_e1000_O/lib/modules/2.4.19-64GB-SMP/kernel/drivers/net/"
                           "e1000/e1000.o_M"));
@@ -126,16 +126,17 @@ TEST(FileMachine, HasNoDriverAndNamesItsArchitectureFileInItsFirmware) {
               "error ENOENT\n"
               "ret 0\n"
               "error ENOENT\n"
-              "00 01 02 03 devices\n"
+              "00 01 02 03 04 devices\n"
               "   S   M   B\n"
-              "   8   6   7   0   2   R   Y\n"
-              "86702RY.pci\ndbgprint\n");
+              "   K   3   2   0   F   1   T\n"
+              "K320F1T.pci\ndbgprint\n");
     EXPECT_FALSE(IsDirectory(run + "/driver"));
     EXPECT_EQ(ExpectNamedDevicesAndLoadedDrivers(FILE_MACHINE),
-              (std::set<std::string>{"bcm5700", "eepro100", "mptbase", "qla2300", "usb-ohci"}));
+              (std::set<std::string>{"aic7xxx", "bcm5700", "eepro100", "mptbase", "qla2300",
+                                     "usb-ohci"}));
     // The library's own reader takes the architecture file without a complaint.
     const RunResult compiled =
-        RunProgram({PCI2ASL, FILE_MACHINE + "/install/86702RY.pci", dir / "asl.bin"});
+        RunProgram({PCI2ASL, FILE_MACHINE + "/install/K320F1T.pci", dir / "asl.bin"});
     EXPECT_EQ(compiled.Status, 0) << compiled.Err;
     EXPECT_EQ(FileText(dir / "asl.bin").substr(0, 4), "VHSL");
 }

@@ -42,7 +42,7 @@ std::string WriteTestMachine(const ScratchDir& dir, const std::string& name) {
               "02:1f.3 Ethernet controller: Intel Corporation 82557\n"
               "00: 86 80 29 12 07 00 90 02 08 00 00 02 10 40 00 00\n"
               "10: 00 00 00 00\n");
-    dir.Write(root + "firmware", "record 0x1234\ntype 8870\nmodel 4RX\n");
+    dir.Write(root + "firmware", "record 0x1234\ntype K740\nmodel C4D\n");
     dir.Write(root + "install/dbgprint", "hwdbgprint 0x0\n");
     return dir / name;
 }

@@ -81,7 +81,7 @@ class PreReq : public ::testing::Test {
         SysPaths().Etc = Tree.Scratch().Path("etc");
         SetRelease("SuSE-release", "SuSE SLES-8 (i386)\nVERSION = 8\n");
         ValidVPD = true;
-        std::memcpy(Vpd.MachineTypeModel, "8870ABC", sizeof(Vpd.MachineTypeModel));
+        std::memcpy(Vpd.MachineTypeModel, "K740ABC", sizeof(Vpd.MachineTypeModel));
     }
     void TearDown() override {
         ResetSystemAccess();
@@ -306,7 +306,7 @@ TEST_F(PreReq, SlotDriverBranches) {
 
 TEST_F(PreReq, PciArchitectureFileReplacesTheDriver) {
     FakeModules().Modules.clear();
-    Tree.Scratch().Write("inst/8870ABC.pci", "");
+    Tree.Scratch().Write("inst/K740ABC.pci", "");
     EXPECT_EQ(FreshCheck(), PREREQ_OK);
     EXPECT_TRUE(UsingPciFile);
     EXPECT_EQ(FakeModules().Calls, 0);
@@ -320,7 +320,7 @@ TEST_F(PreReq, PciArchitectureFileReplacesTheDriver) {
 TEST_F(PreReq, VitalProductDataIsReadUntilFound) {
     ValidVPD = false;
     std::memset(&Vpd, 0, sizeof(Vpd));
-    Tree.Scratch().Write("inst/8870ABC.pci", "");
+    Tree.Scratch().Write("inst/K740ABC.pci", "");
     EXPECT_EQ(FreshCheck(), PREREQ_OK);  // no memory image: through the driver
     EXPECT_FALSE(UsingPciFile);
 
@@ -328,7 +328,7 @@ TEST_F(PreReq, VitalProductDataIsReadUntilFound) {
     record.Header1 = 0xAA;
     record.Header2 = 0x55;
     std::memcpy(record.Signature, "VPD", 3);
-    std::memcpy(record.MachineTypeModel, "8870ABC", 7);
+    std::memcpy(record.MachineTypeModel, "K740ABC", 7);
     std::string image(VPD_SEGMENT_OFFSET + VPD_SEGMENT_SIZE, '\0');
     image.replace(VPD_SEGMENT_OFFSET + 0x1234, sizeof(record),
                   reinterpret_cast<const char*>(&record), sizeof(record));

@@ -57,9 +57,9 @@ class VpdTest : public ::testing::Test {
 };
 
 TEST_F(VpdTest, TakesTheRecordAtTheLowestOffset) {
-    const _VPD_LAYOUT low = Record("8870AAA");
+    const _VPD_LAYOUT low = Record("K740AAA");
     Put(0x1234, low);
-    Put(0x8000, Record("8870BBB"));
+    Put(0x8000, Record("K740BBB"));
     // Header bytes followed by another signature are no record.
     Put(0x0100, "\xAA\x55VPX", 5);
     Put(0x0200, "\xAA\x54VPD", 5);

@@ -15,7 +15,8 @@ public final class CommandLine {
         "usage: TarnovaAgent [--json | --blink SLOT STATE]",
         "  (no option)         collect the slot hardware and print a readable report",
         "  --json              collect the slot hardware and print one JSON document",
-        "  --blink SLOT STATE  set the blink state of a slot's attention LED (no collection)",
+        "  --blink SLOT STATE  collect the slot hardware and set the blink state of a slot's",
+        "                      attention LED",
         "");
 
     private enum Mode { REPORT, JSON, BLINK, HELP }
@@ -68,6 +69,17 @@ public final class CommandLine {
         }
     }
 
+    /** The lifecycle around one blink, so that it is logged and traced as every call is. */
+    private static void blink(TarnovaAgent agent, long slot, int state) {
+        agent.getDebugFileReady();
+        try {
+            agent.getHwInfoReady();
+            agent.BlinkCmd(slot, state);
+        } finally {
+            agent.getReadyToExit();
+        }
+    }
+
     /** Runs the command line against the agent that supplier creates; returns the exit code. */
     public static int run(String[] args, Supplier<TarnovaAgent> agents, PrintStream out,
                           PrintStream err) {
@@ -84,7 +96,7 @@ public final class CommandLine {
                 out.print(USAGE);
                 return EXIT_OK;
             case BLINK:
-                agents.get().BlinkCmd(command.slot, command.state);
+                blink(agents.get(), command.slot, command.state);
                 return EXIT_OK;
             default:
                 Inventory inventory;

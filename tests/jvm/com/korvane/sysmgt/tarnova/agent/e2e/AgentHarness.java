@@ -48,11 +48,7 @@ public final class AgentHarness {
     private boolean jniLog;
     private Path machine;
     private final Map<String, String> environment = new LinkedHashMap<>();
-    // No perf data file: under the simulator every JVM is process 2 of its own process namespace
-    // but shares /tmp, so parallel runs would contend for one /tmp/hsperfdata_USER/2 and the
-    // loser warns on standard output, in the middle of what the tests read.
-    private final List<String> jvmOptions =
-        new ArrayList<>(List.of("-Xcheck:jni", "-XX:-UsePerfData"));
+    private final List<String> jvmOptions = new ArrayList<>(List.of("-Xcheck:jni"));
     private final List<MachineEdit> machineEdits = new ArrayList<>();
 
     /** A change to the run's copy of the machine folder, made before the simulator starts. */

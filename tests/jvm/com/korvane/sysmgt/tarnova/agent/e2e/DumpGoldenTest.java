@@ -18,7 +18,7 @@ import org.junit.jupiter.api.io.TempDir;
  * VELH_GOLDEN_UPDATE=1 in the environment the logs are written there instead, for review.
  */
 class DumpGoldenTest {
-    private static final Path SAMPLE = AgentHarness.sampleMachine("x440-chassis-drawer");
+    private static final Path SAMPLE = AgentHarness.sampleMachine("chassis-drawer");
     private static final Map<String, String> LEVELS = Map.ofEntries(
         Map.entry("raw-asl", "0x00000001"),
         Map.entry("cooked-asl", "0x00000002"),

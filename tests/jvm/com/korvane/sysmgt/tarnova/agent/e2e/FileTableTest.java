@@ -19,11 +19,11 @@ import org.junit.jupiter.api.io.TempDir;
  * the one with a driver, which the file then replaces.
  */
 class FileTableTest {
-    private static final Path FILE_MACHINE = AgentHarness.sampleMachine("x345-file-table");
-    private static final Path DRIVER_MACHINE = AgentHarness.sampleMachine("x440-chassis-drawer");
-    /** The file machine's firmware record says type 8670, model 2RY. */
-    private static final String TYPE_MODEL_FILE = "install/86702RY.pci";
-    private static final String TYPE_FILE = "install/8670.pci";
+    private static final Path FILE_MACHINE = AgentHarness.sampleMachine("file-table");
+    private static final Path DRIVER_MACHINE = AgentHarness.sampleMachine("chassis-drawer");
+    /** The file machine's firmware record says type K320, model F1T. */
+    private static final String TYPE_MODEL_FILE = "install/K320F1T.pci";
+    private static final String TYPE_FILE = "install/K320.pci";
     private static final String DRIVER_TABLE_SOURCE = "driver/asl.pci";
     /** Worked out later from the adapters and the load limits, for a table from a file only. */
     private static final String[] DERIVED_FIELDS = {"CurBusSpeed", "InPciXMode"};
@@ -66,7 +66,7 @@ class FileTableTest {
     @Test
     void aFileBeatsTheDriverWhichIsNotAskedForItsTable() throws IOException {
         AgentHarness.Result result = new AgentHarness(temp).onMachine(DRIVER_MACHINE)
-            .editMachine(copy(FILE_MACHINE.resolve(TYPE_MODEL_FILE), "install/88704RX.pci"))
+            .editMachine(copy(FILE_MACHINE.resolve(TYPE_MODEL_FILE), "install/K740C4D.pci"))
             .scenario("json", "blink:3:1");
         assertEquals(0, result.exitCode, result::toString);
         Map<String, Object> document = result.document(result.values("json").get(0));
@@ -102,7 +102,7 @@ class FileTableTest {
         // is then no table at all.
         AgentHarness.Result otherModel = new AgentHarness(temp).onMachine(FILE_MACHINE)
             .editMachine(machine -> Files.move(machine.resolve(TYPE_MODEL_FILE),
-                machine.resolve("install/86704RX.pci")))
+                machine.resolve("install/K320C4D.pci")))
             .agent("--json");
         assertEquals(0, otherModel.exitCode, otherModel::toString);
         Map<String, Object> none = otherModel.document();

@@ -9,6 +9,9 @@ import java.nio.file.Files;
 import java.nio.file.Path;
 import java.util.List;
 import java.util.Map;
+import java.util.concurrent.CompletableFuture;
+import java.util.stream.Collectors;
+import java.util.stream.IntStream;
 import org.junit.jupiter.api.Test;
 import org.junit.jupiter.api.io.TempDir;
 
@@ -21,7 +24,7 @@ class MachineTest {
 
     private AgentHarness harness() {
         Path machines = Path.of(AgentHarness.property("velh.machines.dir"));
-        return new AgentHarness(temp).onMachine(machines.resolve("x440-chassis-drawer"));
+        return new AgentHarness(temp).onMachine(machines.resolve("chassis-drawer"));
     }
 
     @Test
@@ -44,6 +47,21 @@ class MachineTest {
             Object busId = ((Map<?, ?>) slot).get("BusID");
             assertTrue(busses.stream().anyMatch(bus -> busId.equals(((Map<?, ?>) bus).get("BusID"))),
                 slot::toString);
+        }
+    }
+
+    @Test
+    void fourRunsSideBySideEachPrintOneCleanDocument() {
+        // Each JVM is process 2 of its namespace: its perf data file goes to the run's own /tmp.
+        List<AgentHarness.Result> results = IntStream.range(0, 4)
+            .mapToObj(i -> CompletableFuture.supplyAsync(() -> harness().agent("--json"),
+                command -> new Thread(command).start()))
+            .collect(Collectors.toList()).stream().map(CompletableFuture::join)
+            .collect(Collectors.toList());
+        for (AgentHarness.Result result : results) {
+            assertEquals(results.get(0).document(), result.document(), result::toString);
+            String perfData = "tmp/hsperfdata_" + System.getProperty("user.name");
+            assertTrue(Files.isDirectory(result.runDir.resolve(perfData)), result::toString);
         }
     }
 

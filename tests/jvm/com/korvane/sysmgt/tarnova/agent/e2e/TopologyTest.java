@@ -21,7 +21,7 @@ import org.junit.jupiter.api.io.TempDir;
  * what the driver is asked, and what each failing request costs.
  */
 class TopologyTest {
-    private static final Path SAMPLE = AgentHarness.sampleMachine("x440-chassis-drawer");
+    private static final Path SAMPLE = AgentHarness.sampleMachine("chassis-drawer");
     private static final String TABLE_SOURCE = "driver/asl.pci";
     private static final String UNAVAILABLE =
         "velhlib, GetHwInfo():  PCI architecture information is unavailable";
@@ -59,7 +59,7 @@ class TopologyTest {
         AgentHarness.Result result = harness().withJniLog().editMachine(machine -> {
             Path source = machine.resolve(TABLE_SOURCE);
             String original = Files.readString(source);
-            String edited = original.replace("\"x440 Chassis\"", "\"" + longName + "\"");
+            String edited = original.replace("\"KS-740 Chassis\"", "\"" + longName + "\"");
             assertNotEquals(original, edited, "the chassis name is in the table source");
             Files.writeString(source, edited);
         }).agent("--json");
