@@ -15,6 +15,19 @@ const FieldWriter& SystemDescriptorField() {
     return field;
 }
 
+// Chassis and drawer descriptors differ only in the name of byte 2.
+template <typename Record>
+void DumpSystemDescriptor(const char* title, const char* idLabel, uint8_t id,
+                          const Record* descriptor) {
+    const FieldWriter& field = SystemDescriptorField();
+    DumpTitle(title);
+    field.Number("DescriptorType", descriptor->DescriptorType);
+    field.Number("Length", descriptor->Length);
+    field.Number(idLabel, id);
+    field.Number("Reserved0", descriptor->Reserved0);
+    field.Number("StringID", descriptor->StringID);
+}
+
 // Dumps each descriptor the walk hands out and counts the known ones.
 class AslDumper : public AslVisitor {
   public:
@@ -96,23 +109,11 @@ void DumpAslPacket(const _ASL_PACKET* packet, uint32_t size) {
 }
 
 void DumpChassisDescriptor(const _ASL_CHASSIS_DESCRIPTOR* descriptor) {
-    const FieldWriter& field = SystemDescriptorField();
-    DumpTitle("Chassis Descriptor\n");
-    field.Number("DescriptorType", descriptor->DescriptorType);
-    field.Number("Length", descriptor->Length);
-    field.Number("ChassisID", descriptor->ChassisID);
-    field.Number("Reserved0", descriptor->Reserved0);
-    field.Number("StringID", descriptor->StringID);
+    DumpSystemDescriptor("Chassis Descriptor\n", "ChassisID", descriptor->ChassisID, descriptor);
 }
 
 void DumpDrawerDescriptor(const _ASL_DRAWER_DESCRIPTOR* descriptor) {
-    const FieldWriter& field = SystemDescriptorField();
-    DumpTitle("Drawer Descriptor\n");
-    field.Number("DescriptorType", descriptor->DescriptorType);
-    field.Number("Length", descriptor->Length);
-    field.Number("DrawerID", descriptor->DrawerID);
-    field.Number("Reserved0", descriptor->Reserved0);
-    field.Number("StringID", descriptor->StringID);
+    DumpSystemDescriptor("Drawer Descriptor\n", "DrawerID", descriptor->DrawerID, descriptor);
 }
 
 void DumpBusDescriptor(const _ASL_BUS_DESCRIPTOR* descriptor) {
