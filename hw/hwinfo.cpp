@@ -5,6 +5,8 @@
 #include "adapters/adapterdump.h"
 #include "adapters/linadapt.h"
 #include "asl.h"
+#include "cardfile/cardfile.h"
+#include "cardfile/spclcase.h"
 #include "diag/hwdebug.h"
 #include "diag/hwdump.h"
 #include "hw/adapterxref.h"
@@ -102,12 +104,25 @@ bool GetHwInfo() {
     GetAdapterInfo();
     XRefSlotAdapter();
 
+    TraceAcquire("GetHwInfo():  getting adapter info file\n");
+    if (GetAdapterFile() != 0) {
+        TraceAcquire("GetHwInfo():  xrefing adapter file\n");
+        XRefAdapterFile();
+        TraceAcquire("GetHwInfo():  merging adapter file()\n");
+        MergeAdapterFile();
+    }
+
     TraceAcquire("GetHwInfo():  hardware info acquired\n");
     // Only a table from the file leaves the speeds to be worked out; the driver states them.
     if (fileTable) {
         TraceAcquire("GetHwInfo():  deriving bus speeds\n");
         DeriveCurrentBusSpeeds();
     }
+
+    SpecialCaseSystems();
+    SpecialCaseBusses();
+    SpecialCaseSlots();
+    SpecialCaseAdapters();
     DumpResults();
     StopHwInfo();
     return true;
