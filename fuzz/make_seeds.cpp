@@ -52,9 +52,10 @@ AslBuilder Machine() {
 }
 
 std::vector<uint8_t> TracedMachine() {
-    // Bit 0 of the header's first reserved byte: the harness switches the traces on.
+    // Bits 0 and 1 of the header's first reserved byte: the harness switches the traces and
+    // the packet dumps on.
     std::vector<uint8_t> bytes = Machine().Bytes;
-    bytes[offsetof(_ASL_TABLE_HEADER, Reserved)] |= 1;
+    bytes[offsetof(_ASL_TABLE_HEADER, Reserved)] |= 3;
     return bytes;
 }
 
