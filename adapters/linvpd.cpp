@@ -17,25 +17,6 @@ bool ValidVPD = false;
 
 namespace {
 
-// Reads up to size bytes, going on after short reads; the count read, or -1 on an error.
-int32_t ReadFully(int fd, uint8_t* buffer, uint32_t size) {
-    uint32_t total = 0;
-    while (total < size) {
-        ssize_t got = read(fd, buffer + total, size - total);
-        if (got < 0 && errno == EINTR) {
-            continue;
-        }
-        if (got < 0) {
-            return -1;
-        }
-        if (got == 0) {
-            break;
-        }
-        total += static_cast<uint32_t>(got);
-    }
-    return static_cast<int32_t>(total);
-}
-
 bool IsRecordAt(const uint8_t* at) {
     return at[0] == 0xAA && at[1] == 0x55 && std::memcmp(at + 2, "VPD", 3) == 0;
 }

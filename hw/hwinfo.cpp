@@ -2,9 +2,12 @@
 
 #include <memory>
 
+#include "adapters/linadapt.h"
 #include "asl.h"
 #include "diag/hwdebug.h"
+#include "hw/adapterxref.h"
 #include "hw/aslstore.h"
+#include "hw/busspeed.h"
 #include "hwobjects.h"
 #include "setup/linsetup.h"
 #include "sources/filetabl.h"
@@ -66,7 +69,16 @@ bool GetHwInfo() {
     TraceAcquire("GetHwInfo():  storing PCI architecture table\n");
     StoreAslTable(packet.get(), size);
 
+    TraceAcquire("GetHwInfo():  getting adapter info\n");
+    GetAdapterInfo();
+    XRefSlotAdapter();
+
     TraceAcquire("GetHwInfo():  hardware info acquired\n");
+    // Only a table from the file leaves the speeds to be worked out; the driver states them.
+    if (fileTable) {
+        TraceAcquire("GetHwInfo():  deriving bus speeds\n");
+        DeriveCurrentBusSpeeds();
+    }
     StopHwInfo();
     return true;
 }

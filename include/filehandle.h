@@ -1,8 +1,11 @@
-// Owning handles for C library resources: a stdio stream, malloc'ed memory, a file descriptor.
+// Owning handles for C library resources: a stdio stream, malloc'ed memory, a file descriptor,
+// and a read that goes on after short reads.
 #pragma once
 
 #include <unistd.h>
 
+#include <cerrno>
+#include <cstdint>
 #include <cstdio>
 #include <cstdlib>
 #include <memory>
@@ -45,3 +48,23 @@ class UniqueFd {
   private:
     int Fd;
 };
+
+// Reads up to size bytes, going on after short reads; the count read, or -1 on an error.
+inline int32_t ReadFully(int fd, void* buffer, uint32_t size) {
+    auto* bytes = static_cast<uint8_t*>(buffer);
+    uint32_t total = 0;
+    while (total < size) {
+        ssize_t got = read(fd, bytes + total, size - total);
+        if (got < 0 && errno == EINTR) {
+            continue;
+        }
+        if (got < 0) {
+            return -1;
+        }
+        if (got == 0) {
+            break;
+        }
+        total += static_cast<uint32_t>(got);
+    }
+    return static_cast<int32_t>(total);
+}

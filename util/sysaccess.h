@@ -13,6 +13,9 @@ struct SystemPaths {
     std::string Etc = "/etc";
     std::string SysconfigKernel = "/etc/sysconfig/kernel";
     std::string PciIds = "/usr/share/pci.ids";
+    // Where current distributions keep the database, looked at when PciIds does not open.
+    std::string PciIdsMisc = "/usr/share/misc/pci.ids";
+    std::string PciIdsHwdata = "/usr/share/hwdata/pci.ids";
     std::string DevMem = "/dev/mem";
     std::string SlotDriver = "/dev/velhpdrv";
 };

@@ -8,6 +8,7 @@
 #include <cstring>
 #include <memory>
 #include <optional>
+#include <string_view>
 #include <utility>
 #include <vector>
 
@@ -240,13 +241,21 @@ int QueryModule(const std::string& run, const char* name, int which, void* buffe
                 return Fail(EINVAL);
         }
     }
-    const std::vector<std::string> names = ModuleNames(run);
-    const auto found = std::find(names.begin(), names.end(), name);
-    if (found == names.end()) {
+    // The module is looked up directly; the folder is listed only for the answers that depend
+    // on the module's place in name order (its default address) or on the other modules, since a
+    // driver asks about its modules once for every PCI function.
+    const std::string_view wanted(name);
+    if (wanted == "." || wanted == ".." || wanted.find('/') != std::string_view::npos ||
+        !IsDirectory(JoinPath(ModulesDir(run), name))) {
         return Fail(ENOENT);
     }
-    const std::optional<Module> module =
-        LoadModule(run, *found, static_cast<size_t>(found - names.begin()));
+    std::vector<std::string> names;
+    size_t index = 0;
+    if (which == QM_INFO || which == QM_MODULES) {
+        names = ModuleNames(run);
+        index = static_cast<size_t>(std::find(names.begin(), names.end(), wanted) - names.begin());
+    }
+    const std::optional<Module> module = LoadModule(run, name, index);
     if (!module) {
         return Fail(EIO);
     }

@@ -1,6 +1,7 @@
 #include "hw/hwinfo.h"
 
 #include <gtest/gtest.h>
+#include <sys/stat.h>
 
 #include <cerrno>
 #include <cstring>
@@ -79,6 +80,7 @@ class HwInfoTest : public ::testing::Test {
         SysPaths().DevMem = Tree.Scratch().Path("no-mem");
         SysPaths().Etc = Tree.Scratch().Path("no-etc");
         SysPaths().SlotDriver = Tree.Scratch().Path("no-driver");
+        SysPaths().ProcBusPci = Tree.Scratch().Path("no-pci");
         SysCalls().Ioctl = DriverIoctl;
         DriverTable.clear();
         Tree.Scratch().Write("inst/dbgprint", "hwdbgprint 0x10\n");
@@ -143,9 +145,16 @@ TEST_F(HwInfoTest, ATableFromTheDriverIsStoredAndEachAcquisitionStartsAfresh) {
                       .Chassis(0, 1)
                       .String(1, "Main")
                       .Bus({.BusID = 1, .BusNumber = 3})
-                      .Bus({.BusID = 2, .BusNumber = 4})
-                      .Slot({.SlotID = 5, .BusID = 1, .DeviceNum = 2})
+                      .Bus({.BusID = 2, .BusNumber = 4, .Speed = 7})
+                      .Slot({.SlotID = 5, .BusID = 1, .DeviceNum = 2, .Sun = 1})
                       .End());
+    // One function in the slot; one whose configuration cannot be read takes no identifier.
+    SysPaths().ProcBusPci = Tree.Scratch().Path("pci");
+    for (const char* folder : {"pci", "pci/03"}) {
+        ASSERT_EQ(mkdir(Tree.Scratch().Path(folder).c_str(), 0700), 0);
+    }
+    Tree.Scratch().Write("pci/03/01.0", "short");
+    Tree.Scratch().Write("pci/03/02.0", std::string(64, '\0'));
 
     for (int round = 0; round < 2; ++round) {
         SCOPED_TRACE(round);
@@ -154,31 +163,45 @@ TEST_F(HwInfoTest, ATableFromTheDriverIsStoredAndEachAcquisitionStartsAfresh) {
         EXPECT_EQ(Length(SystemList), 1u);
         EXPECT_EQ(Length(BusList), 2u);
         EXPECT_EQ(Length(SlotList), 1u);
-        EXPECT_EQ(AdapterIndex, 0u);
+        EXPECT_EQ(AdapterIndex, 1u);
+        ASSERT_EQ(Length(AdapterList), 1u);
+        AdapterList.BeginEnumeration();
+        const AdapterDescriptor* adapter = AdapterList.Next();
+        EXPECT_EQ(adapter->AdapterID, 0u);
+        EXPECT_EQ(adapter->BusID, 1u);
+        EXPECT_EQ(adapter->SlotID, 5u);
         EXPECT_EQ(AcquireTrace(Tree.Log()),
-                  (std::vector<std::string>{
-                      "getting table from file", "getting ASL table", "using PCI architecture ASL",
-                      "storing PCI architecture table", "hardware info acquired"}));
+                  (std::vector<std::string>{"getting table from file", "getting ASL table",
+                                            "using PCI architecture ASL",
+                                            "storing PCI architecture table",
+                                            "getting adapter info", "hardware info acquired"}));
     }
+    // The driver's speed stands.
     BusList.BeginEnumeration();
-    EXPECT_EQ(BusList.Next()->BusNum, 4u);
+    const BusDescriptor* bus = BusList.Next();
+    EXPECT_EQ(bus->BusNum, 4u);
+    EXPECT_EQ(bus->CurBusSpeed, 133u);
 }
 
 TEST_F(HwInfoTest, ThePciArchitectureFileTakesPrecedenceOverTheDriver) {
     InstallDriver(AslBuilder().Header().Bus({.BusID = 1}).Bus({.BusID = 2}).End());
     std::memcpy(Vpd.MachineTypeModel, "4321XYZ", sizeof(Vpd.MachineTypeModel));
     ValidVPD = true;
-    Tree.Scratch().Write("inst/4321.pci", "[table header]\nVHSL 1 0 M\n[bus]\n7\n");
+    Tree.Scratch().Write("inst/4321.pci",
+                         "[table header]\nVHSL 1 0 M\n[bus]\n7 0 255 0 0 0 7 1 0 0 0 0\n");
 
     EXPECT_TRUE(GetHwInfo());
 
     ASSERT_EQ(Length(BusList), 1u);
     BusList.BeginEnumeration();
-    EXPECT_EQ(BusList.Next()->BusID, 7u);
-    EXPECT_EQ(
-        AcquireTrace(Tree.Log()),
-        (std::vector<std::string>{"getting table from file", "using PCI architecture file",
-                                  "storing PCI architecture table", "hardware info acquired"}));
+    const BusDescriptor* bus = BusList.Next();
+    EXPECT_EQ(bus->BusID, 7u);
+    // Without adapters the bus steps down from 133 MHz to the first step with a load limit.
+    EXPECT_EQ(bus->CurBusSpeed, 33u);
+    EXPECT_EQ(AcquireTrace(Tree.Log()),
+              (std::vector<std::string>{"getting table from file", "using PCI architecture file",
+                                        "storing PCI architecture table", "getting adapter info",
+                                        "hardware info acquired", "deriving bus speeds"}));
 }
 
 }  // namespace

@@ -1,0 +1,182 @@
+#include <gtest/gtest.h>
+
+#include <cstring>
+#include <string>
+#include <tuple>
+#include <vector>
+
+#include "adapters/cfgspace.h"
+#include "adapters/linadapt.h"
+#include "hw/adapterxref.h"
+#include "hw/busspeed.h"
+#include "scratchdir.h"
+
+namespace {
+
+// A configuration file of `size` bytes with the status word's low byte and the given bytes set.
+std::string Config(size_t size, int status, std::vector<std::pair<int, int>> bytes) {
+    std::string file(size, '\0');
+    file[6] = static_cast<char>(status);
+    for (auto [at, value] : bytes) {
+        file[at] = static_cast<char>(value);
+    }
+    return file;
+}
+
+const _PCI_CONFIG0* Image(const std::string& bytes) {
+    return reinterpret_cast<const _PCI_CONFIG0*>(bytes.data());
+}
+
+TEST(CapabilityWalk, ReadsKnownItemsWithinTheImageAndDerivesPciX) {
+    // File, image length, MaxSpeed, Width (0: no PCI-X item found).
+    const std::tuple<std::string, int, uint32_t, uint32_t> cases[] = {
+        {Config(256, 0x20, {{0x34, 0x40}, {0x40, 7}}), 64, 66, 0},  // no list
+        {Config(256, 0x10, {{0x34, 0x40}, {0x40, 1}, {0x41, 0x50}, {0x50, 5}, {0x52, 0x80}}), 0x5E,
+         33, 0},
+        {Config(256, 0x10, {{0x34, 0x40}, {0x40, 5}}), 0x4A, 33, 0},
+        {Config(256, 0x10, {{0x34, 0x40}, {0x40, 9}, {0x41, 0x50}, {0x50, 7}}), 64, 33, 0},
+        {Config(4096, 0x10, {{0x34, 0xF8}, {0xF8, 7}, {0xFE, 3}}), 256, 133, 64},
+        {Config(256, 0x10, {{0x34, 0x40}, {0x40, 7}}), 0x48, 66, 32},
+        {Config(4096, 0x10, {{0x34, 0xF4}, {0xF4, 5}, {0xF6, 0x80}}), 0xF4, 33, 0},
+        {Config(256, 0x10, {{0x34, 0x40}, {0x40, 1}, {0x41, 0x40}}), 0x48, 33, 0},  // loop
+        {Config(64, 0x10, {{0x34, 0x40}}), 64, 33, 0},
+        {Config(63, 0, {}), 0, 33, 0},
+    };
+    InstallTree tree;
+    for (const auto& [file, length, speed, width] : cases) {
+        std::string image(PCI_CONFIG_SIZE, '\0');
+        const std::string path = tree.Scratch().Write("cfg", file);
+        ASSERT_EQ(GetPciConfig(path.c_str(), 0, 256, image.data()), length) << file.size();
+        AdapterDescriptor adapter;
+        StorePciConfig(Image(image), &adapter, length);
+        EXPECT_EQ(std::tie(adapter.MaxSpeed, adapter.Width, adapter.SupPciX),
+                  std::make_tuple(speed, width, width != 0))
+            << length;
+        EXPECT_EQ(GetCap(Image(image), CAP_PCIX, 0x40), nullptr);
+    }
+    EXPECT_NE(tree.Log().find("cut after 48 items"), std::string::npos);
+    EXPECT_NE(tree.Log().find("item at 0xf4 reaches past"), std::string::npos);
+}
+
+TEST(StorePciConfig, BridgesLeaveTheirSubsystemOutOfPciId) {
+    // Header type, base class, bridge.
+    for (auto [type, base, bridge] : {std::tuple{0x00, 2, false},
+                                      {0x01, 6, true},
+                                      {0x81, 6, true},
+                                      {0x81, 2, false},
+                                      {0x02, 7, false}}) {
+        const std::string image = Config(256, 0,
+                                         {{0, 0x34},
+                                          {1, 0x12},
+                                          {2, 0xcd},
+                                          {3, 0xab},
+                                          {8, 1},
+                                          {0x2c, 0x55},
+                                          {0x2d, 0x55},
+                                          {0x2e, 1},
+                                          {0x0b, base},
+                                          {0x0e, type}});
+        AdapterDescriptor adapter;
+        StorePciConfig(Image(image), &adapter, 64);
+        EXPECT_EQ(adapter.HasBridge, bridge) << type;
+        EXPECT_EQ(adapter.PciId, bridge ? L"1234abcd0000000001" : L"1234abcd5555000101") << type;
+    }
+}
+
+TEST(ProcBusPci, BusFoldersAndFunctionFiles) {
+    _FILE_ATTRIBS entry{};
+    uint32_t device = 0;
+    uint32_t function = 0;
+    for (auto [name, bus] :
+         {std::pair{"1f", 0x1f}, {"0000:00", 0}, {"0000:0a", 10}, {"0000:zz", -1}, {"x1", -1}}) {
+        std::strcpy(entry.EntryName, name);
+        EXPECT_EQ(isBus(&entry, &device) ? static_cast<int>(device) : -1, bus) << name;
+    }
+    for (auto [name, both] :
+         {std::pair{"1f.3", 0x1f3}, {"00.0", 0}, {"00.10", -1}, {"000.0", -1}, {"0x.1", -1}}) {
+        std::strcpy(entry.EntryName, name);
+        const bool found = isAdapter(&entry, &device, &function);
+        EXPECT_EQ(found ? static_cast<int>(device << 4 | function) : -1, both) << name;
+    }
+}
+
+TEST(XRefSlotAdapter, KeepsSlotAndOnBoardAdaptersOfBussesWithVisibleSlots) {
+    // Bus 3: device 2 in slot 5 (power code 1), a hidden slot; bus 4: a hidden slot only.
+    SlotList.Add(new SlotDescriptor{
+        .SlotID = 5, .BusNum = 3, .DevNum = 2, .FriendlyNum = 4, .Status = 1 << 3});
+    SlotList.Add(new SlotDescriptor{.SlotID = 6, .BusNum = 3, .DevNum = 4, .FriendlyNum = 255});
+    SlotList.Add(new SlotDescriptor{.SlotID = 7, .BusNum = 4, .DevNum = 1, .FriendlyNum = 255});
+    // Bus, device, on board, bridge, reason for removal.
+    const std::tuple<uint32_t, uint32_t, bool, bool, const wchar_t*> cases[] = {
+        {3, 2, true, true, L""},
+        {3, 9, true, false, L""},
+        {3, 9, true, true, L"Device is an onboard bridge"},
+        {3, 9, false, false, L"Device is under a bridge on a card"},
+        {4, 1, true, false, L"Device is on a bus without slots"},
+        {8, 0, true, false, L"Device is on a bus without slots"}};
+    for (const auto& [bus, device, onBoard, bridge, why] : cases) {
+        auto* adapter = new AdapterDescriptor;
+        adapter->Bus = bus;
+        adapter->Device = device;
+        adapter->HasBridge = bridge;
+        adapter->OnBoard = onBoard && device != 2;  // as placed: in a slot is not on board
+        const wchar_t* reason = nullptr;
+        EXPECT_EQ(KeepAdapter(device == 2, bus == 3, adapter, &reason), *why == L'\0');
+        EXPECT_STREQ(reason, why);
+        adapter->OnBoard = onBoard;
+        AdapterList.Add(adapter);
+    }
+    XRefSlotAdapter();
+    std::vector<std::vector<uint32_t>> kept;  // SlotID, PowerReq, FriendlyNum, OnBoard
+    AdapterList.BeginEnumeration();
+    while (const AdapterDescriptor* a = AdapterList.Next()) {
+        kept.push_back({a->SlotID, a->PowerReq, a->FriendlyNum, a->OnBoard});
+    }
+    EXPECT_EQ(kept,
+              (std::vector<std::vector<uint32_t>>{{NONE_VALUE, 0, NONE_VALUE, 1}, {5, 15, 4, 0}}));
+    AdapterList.DestroyAll();
+    SlotList.DestroyAll();
+    EXPECT_EQ(std::vector({SlotPowerReq(0x07), SlotPowerReq(0x10), SlotPowerReq(0x18)}),
+              std::vector({8u, 25u, 0u}));
+}
+
+TEST(DeriveCurrentBusSpeeds, SettlesOnTheFastestStepThatCarriesTheLoad) {
+    using Adapters = std::vector<std::pair<uint32_t, bool>>;  // MaxSpeed, SupPciX
+    const Adapters none;
+    const Adapters x133(1, {133, true});
+    // Adapters, LoadAtX133, LoadAtX100, the slower limits (else 0), speed, PCI-X mode.
+    const std::tuple<Adapters, uint32_t, uint32_t, bool, uint32_t, bool> cases[] = {
+        {Adapters(2, x133[0]), 1, 2, true, 100, true},
+        {Adapters(3, x133[0]), 1, 2, true, 66, true},
+        {Adapters(5, x133[0]), 1, 2, true, 33, false},
+        {{x133[0], {66, false}}, 1, 2, true, 66, false},
+        {none, 1, 2, true, 133, true},
+        {none, 0, 0, true, 66, true},
+        {none, 0, 0, false, 33, false},
+        {{{266, true}}, 1, 2, true, 133, true},
+        {{{50, false}}, 1, 2, true, 50, false},
+    };
+    for (const auto& [adapters, atX133, atX100, slower, speed, pcix] : cases) {
+        auto* bus = new BusDescriptor{.BusID = 2,
+                                      .LoadAt33 = slower ? 4u : 0,
+                                      .LoadAt66 = slower ? 2u : 0,
+                                      .LoadAtX66 = slower ? 4u : 0,
+                                      .LoadAtX100 = atX100,
+                                      .LoadAtX133 = atX133};
+        BusList.Add(bus);
+        for (auto [maxSpeed, supPciX] : adapters) {
+            auto* adapter = new AdapterDescriptor;
+            adapter->BusID = 2;
+            adapter->MaxSpeed = maxSpeed;
+            adapter->SupPciX = supPciX;
+            AdapterList.Add(adapter);
+        }
+        DeriveCurrentBusSpeeds();
+        EXPECT_EQ(std::tie(bus->CurBusSpeed, bus->InPciXMode), std::tie(speed, pcix))
+            << adapters.size();
+        AdapterList.DestroyAll();
+        BusList.DestroyAll();
+    }
+}
+
+}  // namespace
