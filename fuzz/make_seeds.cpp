@@ -208,17 +208,6 @@ bool WriteConfigSeeds(const std::string& dir) {
     return ok;
 }
 
-// Marker symbols for fuzz_naming (selector byte 2): a whole one, one without its two parts.
-bool WriteMarkerSeeds(const std::string& dir) {
-    const unsigned long names = 2 * sizeof(module_symbol);
-    const std::string whole = "__insmod_e1000_O/lib/modules/x/e1000.o_M1234_V2";
-    const std::string cut = "__insmod_e1000_O/lib/e1000.o";
-    std::vector<uint8_t> seed = SymbolAnswer(2, {names, names + whole.size() + 1},
-                                             whole + std::string(1, '\0') + cut + '\0');
-    seed.insert(seed.begin(), 2);
-    return Write(dir + "/markers.bin", seed);
-}
-
 }  // namespace
 
 int main(int argc, char** argv) {

@@ -4,6 +4,8 @@
 
 #include "adapters/linadapt.h"
 #include "asl.h"
+#include "cardfile/cardfile.h"
+#include "cardfile/spclcase.h"
 #include "diag/hwdebug.h"
 #include "hw/adapterxref.h"
 #include "hw/aslstore.h"
@@ -73,12 +75,25 @@ bool GetHwInfo() {
     GetAdapterInfo();
     XRefSlotAdapter();
 
+    TraceAcquire("GetHwInfo():  getting adapter info file\n");
+    if (GetAdapterFile() != 0) {
+        TraceAcquire("GetHwInfo():  xrefing adapter file\n");
+        XRefAdapterFile();
+        TraceAcquire("GetHwInfo():  merging adapter file()\n");
+        MergeAdapterFile();
+    }
+
     TraceAcquire("GetHwInfo():  hardware info acquired\n");
     // Only a table from the file leaves the speeds to be worked out; the driver states them.
     if (fileTable) {
         TraceAcquire("GetHwInfo():  deriving bus speeds\n");
         DeriveCurrentBusSpeeds();
     }
+
+    SpecialCaseSystems();
+    SpecialCaseBusses();
+    SpecialCaseSlots();
+    SpecialCaseAdapters();
     StopHwInfo();
     return true;
 }

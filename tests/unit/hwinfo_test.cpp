@@ -171,10 +171,10 @@ TEST_F(HwInfoTest, ATableFromTheDriverIsStoredAndEachAcquisitionStartsAfresh) {
         EXPECT_EQ(adapter->BusID, 1u);
         EXPECT_EQ(adapter->SlotID, 5u);
         EXPECT_EQ(AcquireTrace(Tree.Log()),
-                  (std::vector<std::string>{"getting table from file", "getting ASL table",
-                                            "using PCI architecture ASL",
-                                            "storing PCI architecture table",
-                                            "getting adapter info", "hardware info acquired"}));
+                  (std::vector<std::string>{
+                      "getting table from file", "getting ASL table", "using PCI architecture ASL",
+                      "storing PCI architecture table", "getting adapter info",
+                      "getting adapter info file", "hardware info acquired"}));
     }
     // The driver's speed stands.
     BusList.BeginEnumeration();
@@ -201,7 +201,8 @@ TEST_F(HwInfoTest, ThePciArchitectureFileTakesPrecedenceOverTheDriver) {
     EXPECT_EQ(AcquireTrace(Tree.Log()),
               (std::vector<std::string>{"getting table from file", "using PCI architecture file",
                                         "storing PCI architecture table", "getting adapter info",
-                                        "hardware info acquired", "deriving bus speeds"}));
+                                        "getting adapter info file", "hardware info acquired",
+                                        "deriving bus speeds"}));
 }
 
 }  // namespace

@@ -224,7 +224,7 @@ public final class AgentHarness {
         Files.setPosixFilePermissions(script, PosixFilePermissions.fromString("rwxr-xr-x"));
     }
 
-    private static void copyTree(Path from, Path to) throws IOException {
+    static void copyTree(Path from, Path to) throws IOException {
         try (Stream<Path> paths = Files.walk(from)) {
             for (Path path : (Iterable<Path>) paths::iterator) {
                 Path target = to.resolve(from.relativize(path).toString());

@@ -26,7 +26,8 @@ import java.util.Map;
  * of the table's order; a slot takes chassis and drawer from its bus; a bus supports hot plug
  * when one of its slots does; a system counts the slots of its busses (a drawer's busses by
  * drawer number, a chassis's those in no drawer) and starts at the lowest slot ID; a name
- * reaches Java with at most 100 characters; 4294967295 stands for none.
+ * reaches Java with at most 100 characters; 4294967295 stands for none; on a machine that runs
+ * SuSE SLES-8 no slot supports hot plug, while its busses keep what their slots stated.
  */
 final class PciArchitectureFile {
     static final long NONE = 4294967295L;
@@ -76,12 +77,18 @@ final class PciArchitectureFile {
     private final List<Unit> units = new ArrayList<>();
     private final Map<Integer, String> strings = new HashMap<>();
     private long packetSize = END_MARKER_SIZE;
+    private boolean slotsWithoutHotPlug;
 
     private PciArchitectureFile() {
     }
 
+    /** Reads a file of a machine folder (its driver/ or install/), noting the distribution. */
     static PciArchitectureFile read(Path file) throws IOException {
-        return parse(Files.readString(file, StandardCharsets.ISO_8859_1));
+        PciArchitectureFile table = parse(Files.readString(file, StandardCharsets.ISO_8859_1));
+        Path release = file.toAbsolutePath().getParent().resolveSibling("etc/SuSE-release");
+        table.slotsWithoutHotPlug =
+            Files.exists(release) && Files.readString(release).startsWith("SuSE SLES-8 ");
+        return table;
     }
 
     static PciArchitectureFile parse(String text) {
@@ -177,7 +184,7 @@ final class PciArchitectureFile {
                 "DevNum", slot.device, "FriendlyNum", slot.sun,
                 "Width", (a & 0x04) != 0 ? 64 : 32, "AttnReason", slot.attention,
                 "Status", slot.status, "Sup5V", bit(a, 1), "SupPME", bit(a, 4),
-                "SupSMBUS", bit(a, 5), "SupHotPlug", bit(a, 0),
+                "SupSMBUS", bit(a, 5), "SupHotPlug", slotsWithoutHotPlug ? 0L : bit(a, 0),
                 "PciX", flag((slot.attrib2 & 0x7C) != 0), "SpeedBits", slot.attrib2 & 0x7F,
                 "AttnLedBlinking", bit(slot.led, 3), "HalfLength", bit(a, 6),
                 "LowProfile", bit(a, 7)));
