@@ -90,6 +90,7 @@ class HwInfoTest : public ::testing::Test {
         BusList.DestroyAll();
         SlotList.DestroyAll();
         AdapterList.DestroyAll();
+        FileAdapters.DestroyAll();
         ResetSystemAccess();
         ResetPreReqState();
         HwInfoPrintLevel = 0;
@@ -155,26 +156,34 @@ TEST_F(HwInfoTest, ATableFromTheDriverIsStoredAndEachAcquisitionStartsAfresh) {
     }
     Tree.Scratch().Write("pci/03/01.0", "short");
     Tree.Scratch().Write("pci/03/02.0", std::string(64, '\0'));
+    // Declared: a new description of slot 5's adapter, and twice an adapter for slot 9, which
+    // no slot has. Each list destroys its own descriptors, acquisition after acquisition.
+    const std::string record = " 0 33 8 32 0 0 0 0123456789abcdef01 drv ";
+    Tree.Scratch().Write("inst/velhadp.crd",
+                         "[A] 5" + record + "[B] 9" + record + "[C] 9" + record);
 
-    for (int round = 0; round < 2; ++round) {
+    for (int round = 0; round < 20; ++round) {
         SCOPED_TRACE(round);
         AdapterIndex = 9;
         EXPECT_TRUE(GetHwInfo());
         EXPECT_EQ(Length(SystemList), 1u);
         EXPECT_EQ(Length(BusList), 2u);
         EXPECT_EQ(Length(SlotList), 1u);
-        EXPECT_EQ(AdapterIndex, 1u);
-        ASSERT_EQ(Length(AdapterList), 1u);
+        EXPECT_EQ(AdapterIndex, 2u);
+        ASSERT_EQ(Length(AdapterList), 2u);
         AdapterList.BeginEnumeration();
+        EXPECT_EQ(AdapterList.Next()->Name, L"B");
         const AdapterDescriptor* adapter = AdapterList.Next();
         EXPECT_EQ(adapter->AdapterID, 0u);
         EXPECT_EQ(adapter->BusID, 1u);
         EXPECT_EQ(adapter->SlotID, 5u);
+        EXPECT_EQ(adapter->Name, L"A");
         EXPECT_EQ(AcquireTrace(Tree.Log()),
                   (std::vector<std::string>{
                       "getting table from file", "getting ASL table", "using PCI architecture ASL",
                       "storing PCI architecture table", "getting adapter info",
-                      "getting adapter info file", "hardware info acquired"}));
+                      "getting adapter info file", "xrefing adapter file", "merging adapter file()",
+                      "hardware info acquired"}));
     }
     // The driver's speed stands.
     BusList.BeginEnumeration();

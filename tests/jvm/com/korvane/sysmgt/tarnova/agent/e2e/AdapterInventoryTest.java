@@ -8,6 +8,7 @@ import java.nio.file.Path;
 import java.util.ArrayList;
 import java.util.Collections;
 import java.util.HashMap;
+import java.util.LinkedHashMap;
 import java.util.List;
 import java.util.Map;
 import org.junit.jupiter.api.Test;
@@ -16,11 +17,13 @@ import org.junit.jupiter.api.io.TempDir;
 /**
  * The default sample without its card file: element i of the numeric adapter inventory and of the
  * name, PCI ID and driver inventories is the i-th adapter that the sample's EXPECTED.md keeps,
- * last found first.
+ * last found first, with the boot flag of its final inventory.
  */
 class AdapterInventoryTest {
-    private static final String FIELDS = "AdapterID SlotID MaxSpeed PowerReq Width HasBridge "
-        + "IsBootDev SupPciX OnBoard BusID Device Function Name PciId Driver";
+    private static final String[] FIELDS = ("AdapterID SlotID MaxSpeed PowerReq Width HasBridge "
+        + "IsBootDev SupPciX OnBoard BusID Device Function Name PciId Driver").split(" ");
+    private static final Map<String, String> WORDS =
+        Map.of("(empty)", "", "yes", "1", "no", "0", "-1", "4294967295", "0 (unset)", "0");
 
     @TempDir
     Path temp;
@@ -28,25 +31,21 @@ class AdapterInventoryTest {
     @Test
     void theFourInventoriesDescribeTheExpectedAdaptersElementByElement() throws IOException {
         Path machine = AgentHarness.sampleMachine("chassis-drawer");
-        List<List<Map<String, String>>> tables = tables(machine.resolve("EXPECTED.md"));
-        Map<String, String> names = new HashMap<>();
-        tables.get(1).forEach(row -> names.put(row.get("ID"), row.get("Name")));
-        Map<String, String> from = new HashMap<>();
-        tables.get(2).forEach(row -> from.put(row.get("AdapterID"), row.get("from")));
+        // Discovery and filter, names, final inventory: each keyed by the adapter's identifier.
+        List<Map<String, Map<String, String>>> tables = tables(machine.resolve("EXPECTED.md"));
         List<String> expected = new ArrayList<>();
-        for (Map<String, String> row : tables.get(0)) {
-            if (!row.get("outcome").startsWith("kept")) {
-                continue;
+        tables.get(0).forEach((id, row) -> {
+            if (row.get("outcome").startsWith("kept")) {
+                String[] function = row.get("function").split("[/.]");
+                row.put("AdapterID", id);
+                row.put("OnBoard", row.get("outcome").contains("on-board") ? "1" : "0");
+                row.put("Device", String.valueOf(Integer.parseInt(function[1], 16)));
+                row.put("Function", function[2]);
+                row.put("Name", tables.get(1).get(id).get("Name"));
+                row.put("IsBootDev", tables.get(2).get(id).get("boot"));
+                expected.add(line(row));
             }
-            String[] function = row.get("function").split("[/.]");
-            Map<String, String> adapter = new HashMap<>(row);
-            adapter.put("AdapterID", row.get("ID"));
-            adapter.put("OnBoard", row.get("outcome").contains("on-board") ? "1" : "0");
-            adapter.put("Device", String.valueOf(Integer.parseInt(function[1], 16)));
-            adapter.put("Function", function[2]);
-            adapter.put("Name", names.get(row.get("ID")));
-            expected.add(line(adapter, from.get(row.get("ID"))));
-        }
+        });
         Collections.reverse(expected);
 
         AgentHarness.Result result = new AgentHarness(temp).onMachine(machine)
@@ -57,48 +56,40 @@ class AdapterInventoryTest {
         for (Object adapter : (List<?>) result.document().get("adapters")) {
             Map<String, String> values = new HashMap<>();
             ((Map<?, ?>) adapter).forEach((key, value) -> values.put((String) key, "" + value));
-            actual.add(line(values, from.get(values.get("AdapterID"))));
+            actual.add(line(values));
         }
         assertEquals(expected, actual);
     }
 
-    /** The adapter as the inventories give it; a boot flag that a special case sets is left out. */
-    private static String line(Map<String, String> adapter, String from) {
-        Map<String, String> words =
-            Map.of("(empty)", "", "yes", "1", "no", "0", "-1", "4294967295");
+    private static String line(Map<String, String> adapter) {
         StringBuilder text = new StringBuilder();
-        for (String field : FIELDS.split(" ")) {
-            String value = adapter.get(field).replaceAll(" \\(unset\\)$", "");
-            boolean special = field.equals("IsBootDev") && String.valueOf(from).contains("special");
-            text.append(field).append('=')
-                .append(special ? "*" : words.getOrDefault(value, value)).append(' ');
+        for (String field : FIELDS) {
+            String value = adapter.get(field);
+            text.append(field).append('=').append(WORDS.getOrDefault(value, value)).append(' ');
         }
         return text.toString();
     }
 
-    /** Every table of a Markdown file, its rows keyed by the header's cells. */
-    private static List<List<Map<String, String>>> tables(Path file) throws IOException {
-        List<List<Map<String, String>>> tables = new ArrayList<>();
+    /** Every table of a Markdown file in order, its rows keyed by AdapterID or the first cell. */
+    private static List<Map<String, Map<String, String>>> tables(Path file) throws IOException {
+        List<Map<String, Map<String, String>>> tables = new ArrayList<>();
         String[] header = null;
         for (String text : Files.readAllLines(file)) {
-            if (!text.startsWith("|")) {
+            String[] cells = text.startsWith("|") ? text.substring(1).split("\\|", -1) : null;
+            if (cells == null) {
                 header = null;
             } else if (header == null) {
-                header = cells(text);
-                tables.add(new ArrayList<>());
+                header = cells;
+                tables.add(new LinkedHashMap<>());
             } else if (!text.startsWith("|---")) {
-                String[] cells = cells(text);
                 Map<String, String> row = new HashMap<>();
                 for (int i = 0; i < header.length; i++) {
-                    row.put(header[i], cells[i]);
+                    row.put(header[i].trim(), cells[i].trim());
                 }
-                tables.get(tables.size() - 1).add(row);
+                String id = row.getOrDefault("AdapterID", row.get(header[0].trim()));
+                tables.get(tables.size() - 1).put(id, row);
             }
         }
         return tables;
-    }
-
-    private static String[] cells(String row) {
-        return row.substring(1, row.length() - 1).trim().split("\\s*\\|\\s*", -1);
     }
 }

@@ -93,4 +93,24 @@ class MachineTest {
         assertEquals("5 4294967295\n",
             Files.readString(result.runDir.resolve("driver/blink.log")));
     }
+
+    @Test
+    void theCardFileAddsTheServiceProcessorAndRedescribesTheBridgedCard() {
+        AgentHarness.Result result = harness().agent("--json");
+        // Name, slot, ID, bus, device, bridge, boot, PCI ID and driver of the adapters in the
+        // slots the card file names (9 was empty, 6 held the bridge), and of slot 12's graphics
+        // controller, which the special case makes a boot device.
+        List<String> seen = ((List<?>) result.document().get("adapters")).stream()
+            .map(adapter -> (Map<?, ?>) adapter)
+            .filter(adapter -> List.of(6L, 9L, 12L).contains(adapter.get("SlotID")))
+            .map(adapter -> List.of("Name", "SlotID", "AdapterID", "BusID", "Device",
+                "HasBridge", "IsBootDev", "PciId", "Driver").stream()
+                .map(key -> String.valueOf(adapter.get(key))).collect(Collectors.joining("|")))
+            .collect(Collectors.toList());
+        assertEquals(List.of("KSP-2 Service Processor|9|28|6|2|0|0|100251597e5203c100|ksp2.o",
+            "Advanced Micro Devices, Inc. [AMD/ATI] KSP-2 Service Processor|12|27|7|2|0|1"
+                + "|100251597e5203c100|",
+            "Quad Port 10/100 Ethernet Card|6|14|4|2|1|0|101100260000000005|eepro100.o"), seen);
+        assertFalse(result.hwLog().contains("velhadp.crd"), result::hwLog);
+    }
 }
