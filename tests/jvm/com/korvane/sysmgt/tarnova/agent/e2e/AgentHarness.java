@@ -178,6 +178,11 @@ public final class AgentHarness {
         command.add(i386Java.isEmpty()
             ? Path.of(System.getProperty("java.home"), "bin", "java").toString() : i386Java);
         command.addAll(jvmOptions);
+        if (!i386Java.isEmpty()) {
+            // The interpreter only: under qemu the JIT's code patching across threads now and
+            // then trips the JVM's own checks (an internal error in RelocIterator).
+            command.add("-Xint");
+        }
         command.add("-Djava.library.path=" + libraryDir);
         command.add("-cp");
         command.add(classPath);
