@@ -1,71 +1,20 @@
 package com.korvane.sysmgt.tarnova.agent.e2e;
 
 import static org.junit.jupiter.api.Assertions.assertEquals;
-import static org.junit.jupiter.api.Assertions.assertFalse;
-import static org.junit.jupiter.api.Assertions.assertTrue;
 
 import java.io.IOException;
 import java.nio.file.Files;
 import java.nio.file.Path;
-import java.util.List;
-import java.util.Map;
 import org.junit.jupiter.api.Test;
 import org.junit.jupiter.api.io.TempDir;
 
 /** The agent under the simulator, on the sample machine with a slot driver and a table. */
 class MachineTest {
-    private static final List<String> KINDS = List.of("systems", "busses", "slots", "adapters");
-
     @TempDir
     Path temp;
 
     private AgentHarness harness() {
-        Path machines = Path.of(AgentHarness.property("velh.machines.dir"));
-        return new AgentHarness(temp).onMachine(machines.resolve("x440-chassis-drawer"));
-    }
-
-    @Test
-    void theJsonDocumentCarriesTheMachinesTopology() {
-        AgentHarness.Result result = harness().agent("--json");
-        assertEquals(0, result.exitCode, result::toString);
-        @SuppressWarnings("unchecked")
-        Map<String, Object> document = (Map<String, Object>) MiniJson.parse(result.stdout);
-        assertEquals(0L, document.get("status"), "the sample machine meets every prerequisite");
-        for (String kind : List.of("systems", "busses", "slots")) {
-            assertFalse(((List<?>) document.get(kind)).isEmpty(), kind);
-        }
-        for (Object system : (List<?>) document.get("systems")) {
-            Object name = ((Map<?, ?>) system).get("Name");
-            assertTrue(name instanceof String && !((String) name).isEmpty(), system::toString);
-        }
-        // Every slot sits on a bus of the table.
-        List<?> busses = (List<?>) document.get("busses");
-        for (Object slot : (List<?>) document.get("slots")) {
-            Object busId = ((Map<?, ?>) slot).get("BusID");
-            assertTrue(busses.stream().anyMatch(bus -> busId.equals(((Map<?, ?>) bus).get("BusID"))),
-                slot::toString);
-        }
-    }
-
-    @Test
-    void eachAcquisitionRebuildsTheSameInventoriesAndLogsEveryElement() {
-        AgentHarness.Result result = harness().withJniLog().scenario("debug", "hwinfo",
-            "inventories", "hwinfo", "inventories", "exit");
-        assertEquals(0, result.exitCode, result::toString);
-        assertFalse(result.stdout.contains("WARNING"), result::toString);
-        List<String> lengths = result.values("inventories");
-        assertEquals(2, lengths.size(), result::toString);
-        assertEquals(lengths.get(0), lengths.get(1));
-
-        int[] counts = List.of(lengths.get(0).split(",")).stream()
-            .mapToInt(Integer::parseInt).toArray();
-        // Numeric and string inventories of one kind have one element per object.
-        assertEquals(counts[2], counts[4], "systems");
-        assertEquals(counts[3], counts[5], "adapters");
-        assertTrue(counts[0] > 0 && counts[1] > 0 && counts[2] > 0, lengths.get(0));
-        long elementLines =
-            result.jniLog().lines().filter(line -> line.matches("(\\*-?\\d+)+")).count();
-        assertEquals(2L * (counts[0] + counts[1] + counts[2] + counts[3]), elementLines);
+        return new AgentHarness(temp).onMachine(AgentHarness.sampleMachine("x440-chassis-drawer"));
     }
 
     @Test
