@@ -244,6 +244,10 @@ TEST_F(PreReq, KernelRelease) {
     Release = "2.4.19-64GB-SMP";
     EXPECT_EQ(FreshCheck(), PREREQ_OK);
     EXPECT_STREQ(KernVersion, "2.4.19");
+    // An empty release names no kernel version.
+    Release = "";
+    FreshCheck();
+    EXPECT_EQ(KernVersion, nullptr);
 
     UnameFails = true;
     EXPECT_EQ(FreshCheck(), PREREQ_KERNEL_VERSION);
