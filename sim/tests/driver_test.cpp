@@ -73,31 +73,6 @@ TEST(VelhsimDriver, FailsTheRequestsThatTheFailFileNames) {
     EXPECT_THAT(result.Err, HasSubstr("no three version numbers"));
 }
 
-TEST(VelhsimDriver, LogsEveryRequestItReceivesFailedOrNot) {
-    const ScratchDir dir;
-    const std::string machine = WriteTestMachine(dir);
-    const RunResult result =
-        RunScript(machine, dir / "run",
-                  "fail() { printf '%s\\n' \"$1\" > $VELHSIM_RUN/driver/fail; }\n"
-                  "$PROBE version\n"
-                  "$PROBE table\n"
-                  "fail 'table EBUSY'; $PROBE table\n"
-                  "fail open; $PROBE blink 7 1\n"
-                  "rm $VELHSIM_RUN/driver/fail; $PROBE blink 4294967295 2\n"
-                  "$PROBE ioctl 0x1234\n");
-    ASSERT_EQ(result.Out.substr(0, 14), "version 1.2.3\n") << result.Err;
-    EXPECT_EQ(FileText(dir / "run/driver/requests.log"),
-              "open\nversion\n"
-              "open\nsize\ntable\n"
-              // Refused requests are received all the same.
-              "open\nsize\ntable\n"
-              "open\n"
-              "open\nblink 4294967295 2\n"
-              "open\nioctl 0x1234\n");
-    // The blink log keeps only the blinks that were carried out.
-    EXPECT_EQ(FileText(dir / "run/driver/blink.log"), "4294967295 2\n");
-}
-
 TEST(VelhsimModules, QueryModuleAnswersAsTheLinux24Kernel) {
     const ScratchDir dir;
     const std::string machine = WriteTestMachine(dir);

@@ -33,51 +33,6 @@ bool KnowsDevice(const std::string& ids, const std::string& vendor, const std::s
     return line != std::string::npos && line < end;
 }
 
-TEST(SampleMachine, OffersEveryPartOfTheDescribedServer) {
-    const ScratchDir dir;
-    const std::string run = dir / "run";
-    const RunResult result = RunScript(SAMPLE, run,
-                                       "$PROBE version\n"
-                                       "$PROBE qm velhpdrv 5 64\n"
-                                       "$PROBE uname\n"
-                                       "head -1 /etc/SuSE-release\n"
-                                       "grep ^INITRD_MODULES /etc/sysconfig/kernel\n"
-                                       "echo $(ls /proc/bus/pci)\n"
-                                       "wc -l < /proc/bus/pci/devices\n"
-                                       "od -An -c -j $((0xF5A40 + 40)) -N 7 /dev/mem\n"
-                                       "ls\n");
-    ASSERT_EQ(result.Status, 0) << result.Err;
-    EXPECT_EQ(result.Out,
-              "version 1.0.0\n"
-              "ret " +
-                  std::to_string(4 * sizeof(unsigned long)) +
-                  "\n"
-                  "info d0800000 5000 1 0\n"
-                  "release 2.4.19-64GB-SMP\n"
-                  "SuSE SLES-8 (i386)\n"
-                  "INITRD_MODULES=\"megaraid aic7xxx reiserfs\"\n"
-                  "00 01 02 03 04 05 06 10 11 devices\n"
-                  "28\n"
-                  "   K   7   4   0   C   4   D\n"
-                  "dbgprint\nvelhadp.crd\n");
-}
-
-TEST(SampleMachine, HandsOutTheTableCompiledFromItsArchitectureFile) {
-    const ScratchDir dir;
-    const std::string run = dir / "run";
-    const RunResult result = RunScript(SAMPLE, run, "$PROBE table");
-    ASSERT_EQ(result.Status, 0) << result.Err;
-    // The driver hands out the table that the library's reader makes of driver/asl.pci.
-    const RunResult compiled = RunProgram({PCI2ASL, SAMPLE + "/driver/asl.pci", dir / "asl.bin"});
-    ASSERT_EQ(compiled.Status, 0) << compiled.Err;
-    const std::string table = FileText(dir / "asl.bin");
-    ASSERT_GT(table.size(), 16u);
-    EXPECT_EQ(table.substr(0, 4), "VHSL");
-    EXPECT_EQ(FileText(run + "/driver/asl.bin"), table);
-    const std::string size = std::to_string(table.size());
-    EXPECT_EQ(result.Out, "size " + size + "\ntable " + size + " " + Hex(table) + " next ee\n");
-}
-
 // Checks that every PCI function of the machine is named in its PCI ID database and every bound
 // driver is a loaded module; the names of the drivers.
 std::set<std::string> ExpectNamedDevicesAndLoadedDrivers(const std::string& machine) {

@@ -26,7 +26,8 @@ std::vector<T*> InPacketOrder(ObjListTemp<T>& list) {
 
 class AslStoreTest : public ::testing::Test {
   protected:
-    void TearDown() override {
+    void TearDown() override { Clear(); }
+    static void Clear() {
         HwInfoPrintLevel = 0;
         SystemList.DestroyAll();
         BusList.DestroyAll();
@@ -212,68 +213,39 @@ TEST_F(AslStoreTest, ParseTraceLines) {
     EXPECT_EQ(Tree.Log(), expected);
 }
 
-TEST_F(AslStoreTest, StoreTraceLines) {
-    HwInfoPrintLevel = TRACE_STORE_SYSTEM | TRACE_STORE_STRING;
-    AslBuilder packet;
-    packet.Header().Drawer(3, 1).String(1, "Drawer").End();
-    Store(packet);
-    EXPECT_EQ(Tree.Log(),
-              "\nStored Drawer Descriptor:\n\n"
-              "      desc->SystemID:  0x00  (0)\n"
-              "    desc->ChassisNum:  0xff  (255)\n"
-              "     desc->DrawerNum:  0x03  (3)\n"
-              "      desc->StringID:  0x01  (1)\n"
-              "    desc->ExpnDrawer:  True\n"
-              "\n"
-              "\nStored String Descriptor:\n\n"
-              "    strings[1]:  Drawer\n"
-              "\n");
-}
-
-TEST_F(AslStoreTest, BusAndSlotStoreTraceLines) {
-    HwInfoPrintLevel = TRACE_STORE_ASL;
-    AslBuilder packet;
-    packet.Header()
-        .Bus({0x12, 1, 255, 0x20, 6, 1, 2, 3, 4, 5})
-        .Slot({0x102, 0x12, 3, 4, 0x81, 0x84, 0, 0x18, 8, 1})
-        .End();
-    Store(packet);
-    EXPECT_EQ(Tree.Log(),
-              "\nStored Bus Descriptor:\n\n"
-              "          desc->BusID:  0x12  (18)\n"
-              "     desc->ChassisNum:  0x01  (1)\n"
-              "      desc->DrawerNum:  0xff  (255)\n"
-              "         desc->BusNum:  0x20  (32)\n"
-              "       desc->LoadAt33:  0x01  (1)\n"
-              "       desc->LoadAt66:  0x02  (2)\n"
-              "      desc->LoadAtX66:  0x03  (3)\n"
-              "     desc->LoadAtX100:  0x04  (4)\n"
-              "     desc->LoadAtX133:  0x05  (5)\n"
-              "    desc->CurBusSpeed:  0x64  (100)\n"
-              "     desc->InPciXMode:  True\n"
-              "     desc->SupHotPlug:  False\n"
-              "\n"
-              "      desc->FirstSlot initialized to 0xffffffff\n"
-              "         desc->SlotCt initialized to 0x00000000\n"
-              "\n"
-              "\nStored Slot Descriptor:\n\n"
-              "             desc->SlotID:  0x102  (258)\n"
-              "              desc->BusID:  0x12  (18)\n"
-              "             desc->DevNum:  0x03  (3)\n"
-              "        desc->FriendlyNum:  0x04  (4)\n"
-              "         desc->AttnReason:  0x00  (0)\n"
-              "             desc->Status:  0x18  (24)\n"
-              "          desc->SpeedBits:  0x04  (4)\n"
-              "              desc->Width:  0x20  (32)\n"
-              "               desc->PciX:  True\n"
-              "    desc->AttnLedBlinking:  True\n"
-              "              desc->Sup5V:  False\n"
-              "             desc->SupPME:  False\n"
-              "           desc->SupSMBUS:  False\n"
-              "         desc->SupHotPlug:  True\n"
-              "         desc->HalfLength:  False\n"
-              "         desc->LowProfile:  True\n"
-              "\n");
+TEST_F(AslStoreTest, StoreAndXRefTraceLines) {
+    struct Case {
+        uint32_t Level;
+        AslBuilder Packet;
+        const char* Log;
+    };
+    const Case cases[] = {
+        {TRACE_STORE_SYSTEM | TRACE_STORE_STRING,
+         AslBuilder().Header().Drawer(3, 1).String(1, "Drawer").End(), "aslstore-store-trace.log"},
+        {TRACE_STORE_ASL,
+         AslBuilder()
+             .Header()
+             .Bus({0x12, 1, 255, 0x20, 6, 1, 2, 3, 4, 5})
+             .Slot({0x102, 0x12, 3, 4, 0x81, 0x84, 0, 0x18, 8, 1})
+             .End(),
+         "aslstore-bus-slot-trace.log"},
+        {TRACE_XREF_ASL,
+         AslBuilder()
+             .Header()
+             .String(0, "D")
+             .Drawer(2, 0)
+             .Bus({5, 0, 2, 8})
+             .Slot({6, 5, 1, 1, 1})
+             .End(),
+         "aslstore-xref-trace.log"},
+    };
+    for (const Case& c : cases) {
+        ResetDebugOut();
+        HwInfoPrintLevel = c.Level;
+        Store(c.Packet);
+        EXPECT_EQ(Tree.Log(), TestData(c.Log));
+        Clear();
+    }
 }
 
 TEST_F(AslStoreTest, XRefLinksSlotsToBusses) {

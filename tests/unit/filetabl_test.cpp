@@ -137,6 +137,8 @@ TEST_F(FileTableTest, DataBeforeTheFirstSectionIsReportedAndIgnored) {
     Table table = Read("1 2 3\n[bus]\n4\n");
     EXPECT_EQ(table.Descriptors(), Cat({Bus({4}), END}));
     EXPECT_EQ(Tree.Log(), "\nParseLine(): unknown parse mode 0\n\n");
+    // A last line without its line feed counts like any other.
+    EXPECT_EQ(Read("[bus]\n5").Descriptors(), Cat({Bus({5}), END}));
 }
 
 TEST_F(FileTableTest, NumbersAreCutToTheirFieldWidths) {

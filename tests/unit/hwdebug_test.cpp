@@ -103,40 +103,7 @@ TEST_F(HwDebugTest, ResetStartsANewLogWithTheHelpBlock) {
     EXPECT_EQ(tree.Log(), "");
 
     GetDebugPrintLevel(1);
-    EXPECT_EQ(tree.Log(),
-              "\n"
-              "DebugPrintLevel bits:\n"
-              "\n"
-              "    RAW_ASL                 0x00000001\n"
-              "    COOKED_ASL              0x00000002\n"
-              "    GET_ADAPTER             0x00000004\n"
-              "\n"
-              "    TRACE_ACQUIRE           0x00000010\n"
-              "    TRACE_PARSE             0x00000020\n"
-              "    TRACE_STORE_ASL         0x00000040\n"
-              "    TRACE_XREF_ASL          0x00000080\n"
-              "\n"
-              "    TRACE_STORE_SYSTEM      0x00000100\n"
-              "    TRACE_STORE_BUS         0x00000200\n"
-              "    TRACE_STORE_SLOT        0x00000400\n"
-              "    TRACE_STORE_STRING      0x00000800\n"
-              "    TRACE_PREREQ_CHECK      0x00001000\n"
-              "\n"
-              "    SHOW_OBJECT_ADDRESS     0x00010000\n"
-              "    DUMP_SYSTEMS            0x00020000\n"
-              "    DUMP_BUSSES             0x00040000\n"
-              "    DUMP_SLOTS              0x00080000\n"
-              "    DUMP_SLOT_ADAPTERS      0x00100000\n"
-              "    DUMP_ONBOARD_ADAPTERS   0x00200000\n"
-              "    DUMP_ADAPTERS           0x00300000\n"
-              "    DUMP_DELETED_ADAPTERS   0x00400000\n"
-              "    DUMP_ADAPTER_CFG_SPACE  0x00800000\n"
-              "    DUMP_AGENT_STATS        0x01000000\n"
-              "\n"
-              "    ENTER_EXIT              0x40000000\n"
-              "\n"
-              "    DBGPRINT_HELP           0x80000000\n"
-              "\n");
+    EXPECT_EQ(tree.Log(), TestData("dbgprint-help.log"));
 }
 
 TEST_F(HwDebugTest, TraceAndErrorLineFormats) {

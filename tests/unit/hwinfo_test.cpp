@@ -3,7 +3,6 @@
 #include <gtest/gtest.h>
 #include <sys/stat.h>
 
-#include <cerrno>
 #include <cstring>
 #include <string>
 #include <vector>
@@ -11,35 +10,13 @@
 #include "adapters/linvpd.h"
 #include "aslbuilder.h"
 #include "diag/hwdebug.h"
+#include "fake_driver.h"
 #include "hwobjects.h"
 #include "scratchdir.h"
 #include "setup/linsetup.h"
 #include "util/sysaccess.h"
-#include "velhpdrv.h"
 
 namespace {
-
-// The packet the fake slot driver hands out; empty: the driver has no table.
-std::vector<uint8_t> DriverTable;
-
-int DriverIoctl(int, unsigned long request, void* argument) {
-    if (request == VELH_IOCTL_VERSION) {
-        *static_cast<_VELH_VERSION*>(argument) = _VELH_VERSION{1, 0, 0};
-        return 0;
-    }
-    auto* transfer = static_cast<_VELH_TABLE_XFER*>(argument);
-    if (request == VELH_IOCTL_TABLE_SIZE) {
-        transfer->Size = static_cast<uint32_t>(DriverTable.size());
-        return 0;
-    }
-    if (request == VELH_IOCTL_TABLE) {
-        std::memcpy(transfer->Buffer, DriverTable.data(),
-                    std::min<size_t>(transfer->Size, DriverTable.size()));
-        return 0;
-    }
-    errno = EIO;
-    return -1;
-}
 
 size_t Count(const std::string& text, const std::string& part) {
     size_t count = 0;
@@ -81,8 +58,7 @@ class HwInfoTest : public ::testing::Test {
         SysPaths().Etc = Tree.Scratch().Path("no-etc");
         SysPaths().SlotDriver = Tree.Scratch().Path("no-driver");
         SysPaths().ProcBusPci = Tree.Scratch().Path("no-pci");
-        SysCalls().Ioctl = DriverIoctl;
-        DriverTable.clear();
+        Driver.Install();
         Tree.Scratch().Write("inst/dbgprint", "hwdbgprint 0x10\n");
     }
     void TearDown() override {
@@ -100,10 +76,11 @@ class HwInfoTest : public ::testing::Test {
 
     void InstallDriver(const AslBuilder& table) {
         SysPaths().SlotDriver = Tree.Scratch().Write("velhpdrv", "");
-        DriverTable = table.Bytes;
+        Driver.Table = table.Bytes;
     }
 
     InstallTree Tree;
+    FakeDriver Driver;
     _VPD_LAYOUT SavedVpd{};
     bool SavedValid = false;
 };

@@ -3,70 +3,17 @@
 #include <dirent.h>
 #include <gtest/gtest.h>
 
-#include <cerrno>
 #include <cstring>
 #include <memory>
 #include <string>
 #include <vector>
 
 #include "diag/hwdebug.h"
+#include "fake_driver.h"
 #include "scratchdir.h"
 #include "util/sysaccess.h"
-#include "velhpdrv.h"
 
 namespace {
-
-// A slot driver behind the ioctl seam: answers the four requests from its fields and records
-// what it was sent.
-struct FakeDriver {
-    _VELH_VERSION Version{1, 0, 0};
-    uint32_t TableSize = 0;      // answer to the size request
-    uint32_t DeliveredSize = 0;  // size answered after the table request; 0: the buffer's size
-    unsigned long FailRequest = 0;
-    int FailErrno = EIO;
-
-    std::vector<unsigned long> Requests;
-    std::vector<_VELH_TABLE_XFER> Transfers;  // as sent
-    _VELH_BLINK Blink{};
-};
-
-FakeDriver* Driver = nullptr;
-
-uint8_t TableByte(uint32_t offset) {
-    return static_cast<uint8_t>(offset * 7 + 3);
-}
-
-int FakeIoctl(int /*fd*/, unsigned long request, void* argument) {
-    Driver->Requests.push_back(request);
-    if (request == Driver->FailRequest) {
-        errno = Driver->FailErrno;
-        return -1;
-    }
-    if (request == VELH_IOCTL_VERSION) {
-        *static_cast<_VELH_VERSION*>(argument) = Driver->Version;
-    } else if (request == VELH_IOCTL_TABLE_SIZE || request == VELH_IOCTL_TABLE) {
-        auto* transfer = static_cast<_VELH_TABLE_XFER*>(argument);
-        Driver->Transfers.push_back(*transfer);
-        if (request == VELH_IOCTL_TABLE_SIZE) {
-            transfer->Size = Driver->TableSize;
-        } else {
-            // Fills exactly the buffer it was given, then reports its own size.
-            auto* buffer = static_cast<uint8_t*>(transfer->Buffer);
-            for (uint32_t i = 0; i < transfer->Size; ++i) {
-                buffer[i] = TableByte(i);
-            }
-            if (Driver->DeliveredSize != 0) {
-                transfer->Size = Driver->DeliveredSize;
-            }
-        }
-    } else if (request == VELH_IOCTL_BLINK) {
-        Driver->Blink = *static_cast<_VELH_BLINK*>(argument);
-    } else {
-        errno = EINVAL;
-        return -1;
-    }
-    return 0;
-}
 
 size_t OpenDescriptors() {
     size_t count = 0;
@@ -83,9 +30,8 @@ size_t OpenDescriptors() {
 class SlotDriverTest : public ::testing::Test {
   protected:
     void SetUp() override {
-        Driver = &Fake;
+        Fake.Install();
         SysPaths().SlotDriver = Tree.Scratch().Write("velhpdrv", "");
-        SysCalls().Ioctl = FakeIoctl;
         Packet = std::make_unique<_ASL_PACKET>();
         std::memset(Packet.get(), 0xEE, sizeof(_ASL_PACKET));
         Descriptors = OpenDescriptors();
@@ -95,7 +41,6 @@ class SlotDriverTest : public ::testing::Test {
         EXPECT_EQ(OpenDescriptors(), Descriptors);
         ResetSystemAccess();
         HwInfoPrintLevel = 0;
-        Driver = nullptr;
     }
 
     // The error block of a failed request or open, ending with the error number and its text.
@@ -149,11 +94,11 @@ TEST_F(SlotDriverTest, DriverVersionText) {
 
 TEST_F(SlotDriverTest, ReadsTheTableInTwoSteps) {
     HwInfoPrintLevel = RAW_ASL;
-    Fake.TableSize = 1234;
+    Fake.SetTable(1234);
     EXPECT_EQ(GetAslTable(Packet.get()), 1234u);
     const auto* bytes = reinterpret_cast<const uint8_t*>(Packet.get());
     for (uint32_t i = 0; i < 1234; ++i) {
-        ASSERT_EQ(bytes[i], TableByte(i)) << i;
+        ASSERT_EQ(bytes[i], Fake.Table[i]) << i;
     }
     EXPECT_TRUE(PacketUntouchedFrom(1234));
 
@@ -170,7 +115,7 @@ TEST_F(SlotDriverTest, ReadsTheTableInTwoSteps) {
 
 TEST_F(SlotDriverTest, TableSizesOutsideTheBuffer) {
     // A table larger than the packet buffer is refused before it is asked for.
-    Fake.TableSize = ASL_PACKET_CAPACITY + 1;
+    Fake.SetTable(ASL_PACKET_CAPACITY + 1);
     EXPECT_EQ(GetAslTable(Packet.get()), 0u);
     EXPECT_EQ(Fake.Requests, (std::vector<unsigned long>{VELH_IOCTL_TABLE_SIZE}));
     EXPECT_EQ(Tree.Log(),
@@ -180,21 +125,21 @@ TEST_F(SlotDriverTest, TableSizesOutsideTheBuffer) {
 
     // A table of the full capacity fits.
     Fake.Requests.clear();
-    Fake.TableSize = ASL_PACKET_CAPACITY;
+    Fake.SetTable(ASL_PACKET_CAPACITY);
     EXPECT_EQ(GetAslTable(Packet.get()), ASL_PACKET_CAPACITY);
 
     // Size 0 is no table.
     Fake.Requests.clear();
-    Fake.TableSize = 0;
+    Fake.SetTable(0);
     EXPECT_EQ(GetAslTable(Packet.get()), 0u);
     EXPECT_EQ(Fake.Requests, (std::vector<unsigned long>{VELH_IOCTL_TABLE_SIZE}));
 }
 
 TEST_F(SlotDriverTest, DriverRaisingTheSizeCannotOverrun) {
-    Fake.TableSize = 100;
+    Fake.SetTable(100);
     Fake.DeliveredSize = 5000;
     EXPECT_EQ(GetAslTable(Packet.get()), 100u);
-    EXPECT_EQ(reinterpret_cast<const uint8_t*>(Packet.get())[99], TableByte(99));
+    EXPECT_EQ(reinterpret_cast<const uint8_t*>(Packet.get())[99], Fake.Table[99]);
     EXPECT_TRUE(PacketUntouchedFrom(100));
     EXPECT_EQ(Tree.Log(),
               "\nVELHLIB, GetAslTable():  Driver delivered 5000 bytes into a buffer of 100; the "
@@ -208,7 +153,7 @@ TEST_F(SlotDriverTest, DriverRaisingTheSizeCannotOverrun) {
 }
 
 TEST_F(SlotDriverTest, FailedTableRequests) {
-    Fake.TableSize = 64;
+    Fake.SetTable(64);
     Fake.FailRequest = VELH_IOCTL_TABLE_SIZE;
     EXPECT_EQ(GetAslTable(Packet.get()), 0u);
     EXPECT_EQ(Tree.Log(), ErrorBlock("GetAslTable()", "Read table size IOCTL failed", EIO));

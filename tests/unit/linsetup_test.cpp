@@ -12,40 +12,19 @@
 #include "adapters/modquery.h"
 #include "diag/hwdebug.h"
 #include "setup/linsetup.h"
+#include "tests/unit/fake_driver.h"
 #include "tests/unit/fake_modules.h"
 #include "tests/unit/scratchdir.h"
 #include "util/sysaccess.h"
-#include "velhpdrv.h"
 
 namespace {
 
-struct FakeDriver {
-    bool VersionFails = false;
-    _VELH_VERSION Version{1, 0, 0};
-    uint32_t TableSize = 64;
-    int Requests = 0;
-    int TableRequests = 0;
-};
 FakeDriver Driver;
 
-int FakeIoctl(int, unsigned long request, void* argument) {
-    ++Driver.Requests;
-    if (request == VELH_IOCTL_VERSION && !Driver.VersionFails) {
-        std::memcpy(argument, &Driver.Version, sizeof(Driver.Version));
-        return 0;
-    }
-    auto* transfer = static_cast<_VELH_TABLE_XFER*>(argument);
-    if (request == VELH_IOCTL_TABLE_SIZE) {
-        transfer->Size = Driver.TableSize;
-        return 0;
-    }
-    if (request == VELH_IOCTL_TABLE) {
-        ++Driver.TableRequests;
-        std::memset(transfer->Buffer, 0x81, transfer->Size);
-        return 0;
-    }
-    errno = EIO;
-    return -1;
+// A running driver of version 1.0.0 with a table.
+void ResetDriver() {
+    Driver = FakeDriver{};
+    Driver.SetTable(64);
 }
 
 std::string Release;
@@ -71,9 +50,9 @@ class PreReq : public ::testing::Test {
         ResetPreReqState();
         InstallFakeModules();
         FakeModules().Modules.push_back({"velhpdrv", MOD_RUNNING, {}, {}});
-        SysCalls().Ioctl = FakeIoctl;
+        ResetDriver();
+        Driver.Install();
         SysCalls().Uname = FakeUname;
-        Driver = FakeDriver{};
         Release = "2.4.19-64GB-SMP";
         UnameFails = false;
         SysPaths().SlotDriver = Tree.Scratch().Write("velhpdrv", "");
@@ -265,6 +244,10 @@ TEST_F(PreReq, KernelRelease) {
     Release = "2.4.19-64GB-SMP";
     EXPECT_EQ(FreshCheck(), PREREQ_OK);
     EXPECT_STREQ(KernVersion, "2.4.19");
+    // An empty release names no kernel version.
+    Release = "";
+    FreshCheck();
+    EXPECT_EQ(KernVersion, nullptr);
 
     UnameFails = true;
     EXPECT_EQ(FreshCheck(), PREREQ_KERNEL_VERSION);
@@ -276,27 +259,27 @@ TEST_F(PreReq, SlotDriverBranches) {
     EXPECT_TRUE(DriverLoaded && DriverVerValid && AslTableAvailable);
     EXPECT_STREQ(DriverVersion, "1.0.0");
 
-    Driver.TableSize = 0;
+    Driver.SetTable(0);
     EXPECT_EQ(FreshCheck(), PREREQ_NO_ASL_TABLE);
 
-    Driver = FakeDriver{};
+    ResetDriver();
     Driver.Version = {0, 9, 9};
     EXPECT_EQ(FreshCheck(), PREREQ_DRIVER_VERSION);
 
     // Running, but its version cannot be read: nothing to compare, and no table is asked for.
-    Driver = FakeDriver{};
-    Driver.VersionFails = true;
+    ResetDriver();
+    Driver.FailRequest = VELH_IOCTL_VERSION;
     EXPECT_EQ(FreshCheck(), PREREQ_DRIVER_VERSION);
     EXPECT_TRUE(DriverLoaded);
     EXPECT_FALSE(DriverVerValid);
     EXPECT_EQ(DriverVersion, nullptr);
-    EXPECT_EQ(Driver.TableRequests, 0);
+    EXPECT_EQ(Driver.Count(VELH_IOCTL_TABLE), 0u);
 
     // Loaded but not running: the driver is not asked at all.
-    Driver = FakeDriver{};
+    ResetDriver();
     FakeModules().Modules[0].Flags = 0;
     EXPECT_EQ(FreshCheck(), PREREQ_NO_DRIVER);
-    EXPECT_EQ(Driver.Requests, 0);
+    EXPECT_TRUE(Driver.Requests.empty());
 
     FakeModules().Modules.clear();
     EXPECT_EQ(FreshCheck(), PREREQ_NO_DRIVER);
@@ -310,7 +293,7 @@ TEST_F(PreReq, PciArchitectureFileReplacesTheDriver) {
     EXPECT_EQ(FreshCheck(), PREREQ_OK);
     EXPECT_TRUE(UsingPciFile);
     EXPECT_EQ(FakeModules().Calls, 0);
-    EXPECT_EQ(Driver.Requests, 0);
+    EXPECT_TRUE(Driver.Requests.empty());
 
     // The kernel and distribution checks still come first.
     Release = "2.4.18";
@@ -340,12 +323,12 @@ TEST_F(PreReq, VitalProductDataIsReadUntilFound) {
 
 TEST_F(PreReq, OnceAndEveryCheckFacts) {
     EXPECT_EQ(Check(), PREREQ_OK);
-    EXPECT_EQ(Driver.TableRequests, 1);
+    EXPECT_EQ(Driver.Count(VELH_IOCTL_TABLE), 1u);
 
     // The table is asked for once per library lifetime.
-    Driver.TableSize = 0;
+    Driver.SetTable(0);
     EXPECT_EQ(Check(), PREREQ_OK);
-    EXPECT_EQ(Driver.TableRequests, 1);
+    EXPECT_EQ(Driver.Count(VELH_IOCTL_TABLE), 1u);
 
     // The OS is identified once; the driver facts are gathered anew.
     Release = "2.4.18";

@@ -49,6 +49,15 @@ class ScratchDir {
     std::string Root;
 };
 
+// A file of tests/unit/data: expected logs too long to read well inline.
+inline std::string TestData(const std::string& name) {
+    std::ifstream in(std::string(VELH_TEST_DATA) + "/" + name, std::ios::binary);
+    if (!in) {
+        throw std::runtime_error("no test data " + name);
+    }
+    return std::string((std::istreambuf_iterator<char>(in)), std::istreambuf_iterator<char>());
+}
+
 // Makes directory the working directory for the guard's lifetime.
 class WorkingDir {
   public:

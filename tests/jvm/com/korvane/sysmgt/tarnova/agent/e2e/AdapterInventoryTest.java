@@ -2,6 +2,7 @@ package com.korvane.sysmgt.tarnova.agent.e2e;
 
 import static org.junit.jupiter.api.Assertions.assertEquals;
 
+import com.google.gson.JsonElement;
 import java.io.IOException;
 import java.nio.file.Files;
 import java.nio.file.Path;
@@ -53,9 +54,10 @@ class AdapterInventoryTest {
             .agent("--json");
         assertEquals(0, result.exitCode, result::toString);
         List<String> actual = new ArrayList<>();
-        for (Object adapter : (List<?>) result.document().get("adapters")) {
+        for (JsonElement adapter : result.document().getAsJsonArray("adapters")) {
             Map<String, String> values = new HashMap<>();
-            ((Map<?, ?>) adapter).forEach((key, value) -> values.put((String) key, "" + value));
+            adapter.getAsJsonObject().entrySet()
+                .forEach(field -> values.put(field.getKey(), field.getValue().getAsString()));
             actual.add(line(values));
         }
         assertEquals(expected, actual);

@@ -1,5 +1,12 @@
 package com.korvane.sysmgt.tarnova.agent.e2e;
 
+import static org.junit.jupiter.api.Assertions.assertEquals;
+
+import com.google.gson.JsonArray;
+import com.google.gson.JsonElement;
+import com.google.gson.JsonObject;
+import com.google.gson.JsonParseException;
+import com.google.gson.JsonParser;
 import java.io.File;
 import java.io.IOException;
 import java.io.UncheckedIOException;
@@ -7,7 +14,6 @@ import java.nio.charset.StandardCharsets;
 import java.nio.file.Files;
 import java.nio.file.Path;
 import java.nio.file.StandardCopyOption;
-import java.nio.file.attribute.PosixFilePermissions;
 import java.util.ArrayList;
 import java.util.Arrays;
 import java.util.LinkedHashMap;
@@ -17,38 +23,25 @@ import java.util.concurrent.TimeUnit;
 import java.util.stream.Stream;
 
 /**
- * Runs a main class in a fresh JVM that loads the JNI library, the way the agent runs: the
- * working directory is an install directory with the log directory beside it, and the
- * programs the library starts by name ("slotwatch", "killall") are recording stand-ins first
- * on the search path. Each run gets a new root folder:
+ * Runs a main class in a fresh JVM that loads the JNI library, the way the agent runs: in an
+ * install directory with the log directory beside it, with recording stand-ins for the programs
+ * the library starts by name ("slotwatch", "killall") first on the search path. Each run gets a
+ * new root: ROOT/bin (the stand-ins, each appending its command line to ROOT/calls/NAME),
+ * ROOT/run (install/ and log/) and, with {@link #onMachine}, ROOT/machine, the copy of the machine
+ * folder that {@link #editMachine} changes and the simulator (sim/velhsim) runs the JVM on.
  *
- * <pre>
- *   ROOT/bin/      the stand-ins, each appending its name and arguments to ROOT/calls/NAME
- *   ROOT/run/      install/ (the working directory) and log/
- *   ROOT/machine/  with {@link #onMachine}: the copy of the machine folder given to the simulator
- * </pre>
- *
- * With {@link #onMachine} the JVM runs under the simulator (sim/velhsim in the build
- * directory), which copies the machine folder to ROOT/run and runs the JVM in ROOT/run/install.
- * {@link #editMachine} changes the copy first (failure injection, extra install files), so the
- * machine folders in the source tree stay as they are.
- *
- * <p>Needs the system properties velh.build.dir, velh.agent.jar and velh.test.jar, and for
- * {@link #sampleMachine} velh.machines.dir. With velh.i386.java (a 32-bit JVM's java) the agent
- * runs in that JVM under qemu-i386 (velhsim --i386 with a machine), loading the 32-bit library
- * of velh.build.dir, and the simulator comes from the 64-bit build velh.sim.build.dir.
+ * <p>Needs the system properties velh.build.dir, velh.agent.jar, velh.test.jar and, for machines,
+ * velh.machines.dir and velh.data.dir. With velh.i386.java (a 32-bit JVM's java) the agent runs in
+ * that JVM under qemu-i386 (velhsim --i386 with a machine), loading the 32-bit library of
+ * velh.build.dir, and the simulator comes from the 64-bit build velh.sim.build.dir.
  */
 public final class AgentHarness {
-    public static final String AGENT_CLASS = "com.korvane.sysmgt.tarnova.agent.TarnovaAgent";
-    public static final String SCENARIO_CLASS = Scenario.class.getName();
     private static final long TIMEOUT_SECONDS = 60;
 
     private final Path base;
     private final Path buildDir = Path.of(property("velh.build.dir"));
     private String i386Java = System.getProperty("velh.i386.java", "");
     private Path libraryDir = buildDir;
-    private final String classPath =
-        property("velh.agent.jar") + File.pathSeparator + property("velh.test.jar");
     private boolean jniLog;
     private Path machine;
     private final Map<String, String> environment = new LinkedHashMap<>();
@@ -88,15 +81,43 @@ public final class AgentHarness {
         return count;
     }
 
+    /** A JSON document; a text that is none fails the test with the text shown. */
+    public static JsonObject json(String text) {
+        try {
+            return JsonParser.parseString(text).getAsJsonObject();
+        } catch (JsonParseException | IllegalStateException e) {
+            throw new AssertionError("not a JSON document: " + text, e);
+        }
+    }
+
+    /**
+     * Checks the systems, busses and slots of a document against the expected ones in
+     * tests/jvm/data/NAME, element by element and field by field, leaving out the named fields
+     * (those worked out later for a table from a file, such as the bus speeds).
+     */
+    public static void assertTopology(String name, JsonObject document, String... ignored)
+        throws IOException {
+        JsonObject expected = json(Files.readString(Path.of(property("velh.data.dir"), name)));
+        for (String kind : List.of("systems", "busses", "slots")) {
+            JsonArray want = expected.getAsJsonArray(kind);
+            JsonArray got = document.getAsJsonArray(kind);
+            assertEquals(want.size(), got.size(), () -> kind + ": " + got);
+            for (int i = 0; i < want.size(); i++) {
+                for (Map.Entry<String, JsonElement> field : want.get(i).getAsJsonObject()
+                         .entrySet()) {
+                    if (List.of(ignored).contains(field.getKey())) {
+                        continue;
+                    }
+                    assertEquals(field.getValue(), got.get(i).getAsJsonObject().get(field.getKey()),
+                        kind + " element " + i + " " + field.getKey());
+                }
+            }
+        }
+    }
+
     /** Creates an empty "../log/jni.log", which switches the JNI-side log on. */
     public AgentHarness withJniLog() {
         jniLog = true;
-        return this;
-    }
-
-    /** Runs the JVM under the simulator against a machine folder. */
-    public AgentHarness onMachine(Path machineFolder) {
-        machine = machineFolder;
         return this;
     }
 
@@ -104,6 +125,12 @@ public final class AgentHarness {
     public AgentHarness on64Bit() {
         i386Java = "";
         libraryDir = Path.of(property("velh.sim.build.dir"));
+        return this;
+    }
+
+    /** Runs the JVM under the simulator against a machine folder. */
+    public AgentHarness onMachine(Path machineFolder) {
+        machine = machineFolder;
         return this;
     }
 
@@ -115,11 +142,7 @@ public final class AgentHarness {
 
     /** Writes a file into the run's copy of the machine folder (replacing any). */
     public AgentHarness withMachineFile(String relativePath, String content) {
-        return editMachine(machine -> {
-            Path file = machine.resolve(relativePath);
-            Files.createDirectories(file.getParent());
-            Files.writeString(file, content);
-        });
+        return editMachine(machine -> Files.writeString(machine.resolve(relativePath), content));
     }
 
     public AgentHarness withEnvironment(String name, String value) {
@@ -129,17 +152,73 @@ public final class AgentHarness {
 
     /** Runs the step interpreter {@link Scenario} with the given steps. */
     public Result scenario(String... steps) {
-        return run(SCENARIO_CLASS, steps);
+        return run(Scenario.class.getName(), steps);
     }
 
     /** Runs the agent's own command line. */
     public Result agent(String... args) {
-        return run(AGENT_CLASS, args);
+        return run("com.korvane.sysmgt.tarnova.agent.TarnovaAgent", args);
     }
 
-    public Result run(String mainClass, String... args) {
+    private Result run(String mainClass, String... args) {
         try {
-            return runChecked(mainClass, args);
+            Path root = Files.createTempDirectory(base, "run");
+            Path bin = Files.createDirectories(root.resolve("bin"));
+            Path calls = Files.createDirectories(root.resolve("calls"));
+            for (String program : List.of("slotwatch", "killall")) {
+                Files.writeString(bin.resolve(program),
+                    "#!/bin/sh\necho \"${0##*/}${*:+ $*}\" >> '" + calls.resolve(program) + "'\n");
+                bin.resolve(program).toFile().setExecutable(true);
+            }
+            Path run = root.resolve("run");
+            List<String> command = new ArrayList<>();
+            if (machine != null) {
+                Path copy = root.resolve("machine");
+                copyTree(machine, copy);
+                for (MachineEdit edit : machineEdits) {
+                    edit.apply(copy);
+                }
+                setJniLog(copy.resolve("log"));
+                String sim = System.getProperty("velh.sim.build.dir", buildDir.toString());
+                command.addAll(List.of(Path.of(sim, "sim/velhsim").toString(), "--machine",
+                    copy.toString(), "--run-dir", run.toString()));
+                command.addAll(i386Java.isEmpty() ? List.of("--") : List.of("--i386", "--"));
+            } else {
+                Files.createDirectories(run.resolve("install"));
+                setJniLog(Files.createDirectories(run.resolve("log")));
+                command.addAll(i386Java.isEmpty() ? List.of() : List.of("qemu-i386", "-L", "/"));
+            }
+            command.add(i386Java.isEmpty()
+                ? Path.of(System.getProperty("java.home"), "bin", "java").toString() : i386Java);
+            command.addAll(jvmOptions);
+            if (!i386Java.isEmpty()) {
+                // The interpreter only: under qemu the JIT's code patching across threads now and
+                // then trips the JVM's own checks (an internal error in RelocIterator).
+                command.add("-Xint");
+            }
+            command.addAll(List.of("-Djava.library.path=" + libraryDir, "-cp",
+                property("velh.agent.jar") + File.pathSeparator + property("velh.test.jar"),
+                mainClass));
+            command.addAll(Arrays.asList(args));
+
+            ProcessBuilder builder = new ProcessBuilder(command)
+                .redirectOutput(root.resolve("stdout").toFile())
+                .redirectError(root.resolve("stderr").toFile())
+                .redirectInput(ProcessBuilder.Redirect.from(new File("/dev/null")));
+            // Under the simulator the install directory exists only once the launcher made it.
+            builder.directory(machine != null ? root.toFile() : run.resolve("install").toFile());
+            Map<String, String> env = builder.environment();
+            env.put("PATH", bin + File.pathSeparator + env.getOrDefault("PATH", "/usr/bin:/bin"));
+            env.putAll(environment);
+            Process process = builder.start();
+            // qemu runs the 32-bit JVM several times slower.
+            long timeout = i386Java.isEmpty() ? TIMEOUT_SECONDS : 5 * TIMEOUT_SECONDS;
+            if (!process.waitFor(timeout, TimeUnit.SECONDS)) {
+                process.destroyForcibly().waitFor();
+                throw new IllegalStateException("the JVM did not end within " + timeout + " s: "
+                    + command);
+            }
+            return new Result(root, run, process.exitValue());
         } catch (IOException e) {
             throw new UncheckedIOException(e);
         } catch (InterruptedException e) {
@@ -148,85 +227,12 @@ public final class AgentHarness {
         }
     }
 
-    private Result runChecked(String mainClass, String[] args)
-        throws IOException, InterruptedException {
-        Path root = Files.createTempDirectory(base, "run");
-        Path bin = Files.createDirectories(root.resolve("bin"));
-        Path calls = Files.createDirectories(root.resolve("calls"));
-        for (String program : List.of("slotwatch", "killall")) {
-            writeStandIn(bin.resolve(program), calls.resolve(program));
-        }
-        Path run = root.resolve("run");
-
-        List<String> command = new ArrayList<>();
-        if (machine != null) {
-            Path machineCopy = root.resolve("machine");
-            copyTree(machine, machineCopy);
-            for (MachineEdit edit : machineEdits) {
-                edit.apply(machineCopy);
-            }
-            setJniLog(machineCopy.resolve("log"));
-            String sim = System.getProperty("velh.sim.build.dir", buildDir.toString());
-            command.addAll(List.of(Path.of(sim, "sim/velhsim").toString(), "--machine",
-                machineCopy.toString(), "--run-dir", run.toString()));
-            command.addAll(i386Java.isEmpty() ? List.of("--") : List.of("--i386", "--"));
-        } else {
-            Files.createDirectories(run.resolve("install"));
-            setJniLog(Files.createDirectories(run.resolve("log")));
-            command.addAll(i386Java.isEmpty() ? List.of() : List.of("qemu-i386", "-L", "/"));
-        }
-        command.add(i386Java.isEmpty()
-            ? Path.of(System.getProperty("java.home"), "bin", "java").toString() : i386Java);
-        command.addAll(jvmOptions);
-        if (!i386Java.isEmpty()) {
-            // The interpreter only: under qemu the JIT's code patching across threads now and
-            // then trips the JVM's own checks (an internal error in RelocIterator).
-            command.add("-Xint");
-        }
-        command.add("-Djava.library.path=" + libraryDir);
-        command.add("-cp");
-        command.add(classPath);
-        command.add(mainClass);
-        command.addAll(Arrays.asList(args));
-
-        ProcessBuilder builder = new ProcessBuilder(command)
-            .redirectOutput(root.resolve("stdout").toFile())
-            .redirectError(root.resolve("stderr").toFile())
-            .redirectInput(ProcessBuilder.Redirect.from(new File("/dev/null")));
-        // Under the simulator the install directory exists only once the launcher made it.
-        builder.directory(machine != null ? root.toFile() : run.resolve("install").toFile());
-        Map<String, String> env = builder.environment();
-        env.put("PATH", bin + File.pathSeparator + env.getOrDefault("PATH", "/usr/bin:/bin"));
-        env.putAll(environment);
-
-        Process process = builder.start();
-        // qemu runs the 32-bit JVM several times slower.
-        long timeout = i386Java.isEmpty() ? TIMEOUT_SECONDS : 5 * TIMEOUT_SECONDS;
-        if (!process.waitFor(timeout, TimeUnit.SECONDS)) {
-            process.destroyForcibly().waitFor();
-            throw new IllegalStateException("the JVM did not end within " + timeout
-                + " s: " + String.join(" ", command));
-        }
-        return new Result(root, run, process.exitValue());
-    }
-
     private void setJniLog(Path logDir) throws IOException {
         Path log = logDir.resolve("jni.log");
+        Files.deleteIfExists(log);
         if (jniLog) {
-            if (!Files.exists(log)) {
-                Files.createFile(log);
-            }
-        } else {
-            Files.deleteIfExists(log);
+            Files.createFile(log);
         }
-    }
-
-    private static void writeStandIn(Path script, Path record) throws IOException {
-        Files.writeString(script, "#!/bin/sh\n"
-            + "line=${0##*/}\n"
-            + "for argument in \"$@\"; do line=\"$line $argument\"; done\n"
-            + "echo \"$line\" >> '" + record + "'\n");
-        Files.setPosixFilePermissions(script, PosixFilePermissions.fromString("rwxr-xr-x"));
     }
 
     static void copyTree(Path from, Path to) throws IOException {
@@ -244,81 +250,54 @@ public final class AgentHarness {
 
     /** What one JVM run left behind. */
     public static final class Result {
-        private static final long CALL_WAIT_MILLIS = 10_000;
-        private static final long SETTLE_MILLIS = 300;
-
         public final Path root;
         /** The run folder: install/ and log/, and under the simulator the machine's files. */
         public final Path runDir;
-        public final Path installDir;
-        public final Path logDir;
         public final int exitCode;
         public final String stdout;
         public final String stderr;
 
-        Result(Path root, Path run, int exitCode) throws IOException {
+        Result(Path root, Path run, int exitCode) {
             this.root = root;
             this.runDir = run;
-            this.installDir = run.resolve("install");
-            this.logDir = run.resolve("log");
             this.exitCode = exitCode;
-            this.stdout = readIfExists(root.resolve("stdout"));
-            this.stderr = readIfExists(root.resolve("stderr"));
+            this.stdout = read(root.resolve("stdout"));
+            this.stderr = read(root.resolve("stderr"));
         }
 
         /** The JNI-side log, or null when there is no such file. */
         public String jniLog() {
-            return readIfExists(logDir.resolve("jni.log"));
+            return read(runDir.resolve("log/jni.log"));
         }
 
         /** The hardware-information log, or null when there is no such file. */
         public String hwLog() {
-            return readIfExists(logDir.resolve("velhslot.slotmgr.hwinfo.log"));
+            return read(runDir.resolve("log/velhslot.slotmgr.hwinfo.log"));
         }
 
-        /** The JSON document that the run printed: all of standard output (the agent's --json). */
-        public Map<String, Object> document() {
-            return document(stdout);
+        /** The JSON document that the agent's --json printed. */
+        public JsonObject document() {
+            return json(stdout);
         }
 
-        /** A JSON document of the run; a text that is none fails with the whole run shown. */
-        @SuppressWarnings("unchecked")
-        public Map<String, Object> document(String json) {
-            try {
-                return (Map<String, Object>) MiniJson.parse(json);
-            } catch (IllegalArgumentException | ClassCastException e) {
-                throw new AssertionError("not a JSON document (" + e.getMessage() + "): " + this, e);
-            }
-        }
-
-        /** The copy of the machine folder that the run was given (null without a machine). */
-        public Path machineCopy() {
-            Path copy = root.resolve("machine");
-            return Files.isDirectory(copy) ? copy : null;
-        }
-
-        /**
-         * The requests that the emulated slot driver received, one line each ("open",
-         * "version", "size", "table", "blink SLOT STATE"); empty when it received none.
-         */
+        /** The requests that the emulated slot driver received, one line each. */
         public List<String> driverRequests() {
             return lines(runDir.resolve("driver/requests.log"));
         }
 
         /**
-         * The runs of a stand-in ("slotwatch" or "killall"), one line each: its name and
-         * arguments. The programs run detached and may end after the JVM, so this waits until
-         * at least {@code atLeast} runs are recorded (or a time-out) and a little longer for
-         * any further run.
+         * The runs of a stand-in, one line each: its name and arguments. The programs run
+         * detached and may end after the JVM, so this waits until at least {@code atLeast} runs
+         * are recorded (or 10 s) and a little longer for any further run.
          */
         public List<String> calls(String program, int atLeast) {
             Path record = root.resolve("calls").resolve(program);
-            long deadline = System.currentTimeMillis() + CALL_WAIT_MILLIS;
+            long deadline = System.currentTimeMillis() + 10_000;
             try {
                 while (lines(record).size() < atLeast && System.currentTimeMillis() < deadline) {
                     Thread.sleep(20);
                 }
-                Thread.sleep(SETTLE_MILLIS);
+                Thread.sleep(300);
             } catch (InterruptedException e) {
                 Thread.currentThread().interrupt();
             }
@@ -342,16 +321,15 @@ public final class AgentHarness {
         }
 
         private static List<String> lines(Path file) {
-            String text = readIfExists(file);
+            String text = read(file);
             return text == null || text.isEmpty() ? List.of() : List.of(text.split("\n"));
         }
 
-        private static String readIfExists(Path file) {
+        private static String read(Path file) {
             try {
                 // Decoded leniently: a log is checked, not trusted to be valid text.
                 return Files.exists(file)
-                    ? new String(Files.readAllBytes(file), StandardCharsets.UTF_8)
-                    : null;
+                    ? new String(Files.readAllBytes(file), StandardCharsets.UTF_8) : null;
             } catch (IOException e) {
                 throw new UncheckedIOException(e);
             }

@@ -3,11 +3,11 @@ package com.korvane.sysmgt.tarnova.agent.e2e;
 import static org.junit.jupiter.api.Assertions.assertEquals;
 import static org.junit.jupiter.api.Assertions.assertTrue;
 
+import com.google.gson.JsonObject;
 import java.nio.file.Files;
 import java.nio.file.Path;
 import java.util.ArrayList;
 import java.util.List;
-import java.util.Map;
 import java.util.stream.Stream;
 import org.junit.jupiter.api.Test;
 import org.junit.jupiter.api.io.TempDir;
@@ -30,7 +30,7 @@ class CaptureTest {
         assertEquals(0, builder.start().waitFor(), Files.readString(out));
     }
 
-    private Map<String, Object> json(Path machine) {
+    private JsonObject json(Path machine) {
         AgentHarness.Result result = new AgentHarness(temp).onMachine(machine).agent("--json");
         assertEquals(0, result.exitCode, result::toString);
         return result.document();

@@ -24,7 +24,7 @@ class I386Test {
         AgentHarness.Result i386 = harness().agent("--json");
         AgentHarness.Result x64 = harness().on64Bit().agent("--json");
         assertEquals(0, i386.exitCode, i386::toString);
-        assertEquals(0L, i386.document().get("status"), i386::toString);
+        assertEquals(0L, i386.document().get("status").getAsLong(), i386::toString);
         assertEquals(x64.stdout, i386.stdout);
         // The emulated driver of a 32-bit run knows only the 32-bit request codes; any other
         // would be logged as "ioctl 0xCODE".

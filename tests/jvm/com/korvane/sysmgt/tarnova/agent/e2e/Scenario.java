@@ -6,8 +6,6 @@ import com.korvane.sysmgt.tarnova.agent.cli.JsonWriter;
 import java.io.IOException;
 import java.nio.file.Files;
 import java.nio.file.Path;
-import java.util.ArrayList;
-import java.util.List;
 import java.util.stream.Collectors;
 import java.util.stream.Stream;
 
@@ -76,20 +74,11 @@ public final class Scenario {
     }
 
     private static String inventoryLengths(TarnovaAgent agent) {
-        List<Object[]> arrays = List.of(
-            nullable(agent.getBusNumInv()), nullable(agent.getSlotNumInv()),
-            nullable(agent.getSystemNumInv()), nullable(agent.getAdapterNumInv()),
-            nullable(agent.getSystemNameInv()), nullable(agent.getAdapterNameInv()),
-            nullable(agent.getAdapterPCIIDInv()), nullable(agent.getAdapterDriverInv()));
-        return arrays.stream()
-            .map(array -> array == NULL ? "null" : String.valueOf(array.length))
+        return Stream.of(agent.getBusNumInv(), agent.getSlotNumInv(), agent.getSystemNumInv(),
+                agent.getAdapterNumInv(), agent.getSystemNameInv(), agent.getAdapterNameInv(),
+                agent.getAdapterPCIIDInv(), agent.getAdapterDriverInv())
+            .map(array -> array == null ? "null" : String.valueOf(array.length))
             .collect(Collectors.joining(","));
-    }
-
-    private static final Object[] NULL = new Object[0];
-
-    private static Object[] nullable(Object[] array) {
-        return array == null ? NULL : array;
     }
 
     /** "N zombies=Z": every process whose parent is this JVM, and those of them that ended. */
@@ -97,24 +86,22 @@ public final class Scenario {
         String self = String.valueOf(ProcessHandle.current().pid());
         int children = 0;
         int zombies = 0;
-        List<Path> processes = new ArrayList<>();
         try (Stream<Path> entries = Files.list(Path.of("/proc"))) {
-            entries.filter(p -> p.getFileName().toString().matches("\\d+"))
-                .forEach(processes::add);
-        }
-        for (Path process : processes) {
-            String stat;
-            try {
-                stat = Files.readString(process.resolve("stat"));
-            } catch (IOException gone) {
-                continue;
-            }
-            // pid (comm) state ppid ...; comm may hold blanks and parentheses.
-            String[] fields = stat.substring(stat.lastIndexOf(')') + 2).split(" ");
-            if (fields[1].equals(self)) {
-                children++;
-                if (fields[0].equals("Z")) {
-                    zombies++;
+            for (Path process : (Iterable<Path>) entries::iterator) {
+                if (!process.getFileName().toString().matches("\\d+")) {
+                    continue;
+                }
+                String stat;
+                try {
+                    stat = Files.readString(process.resolve("stat"));
+                } catch (IOException gone) {
+                    continue;
+                }
+                // pid (comm) state ppid ...; comm may hold blanks and parentheses.
+                String[] fields = stat.substring(stat.lastIndexOf(')') + 2).split(" ");
+                if (fields[1].equals(self)) {
+                    children++;
+                    zombies += fields[0].equals("Z") ? 1 : 0;
                 }
             }
         }
