@@ -8,6 +8,7 @@
 #include <cstring>
 #include <cwchar>
 
+#include "adapters/adapterdump.h"
 #include "diag/hwdebug.h"
 #include "filehandle.h"
 
@@ -148,8 +149,9 @@ const CAP_ITEM_HEADER* GetCap(const _PCI_CONFIG0* config, CAP_TYPE type, int len
 }
 
 bool StorePciConfig(const _PCI_CONFIG0* config, AdapterDescriptor* adapter, int length) {
-    // The GET_ADAPTER dump of the image (DumpPciConfigSpace, the device-specific area included
-    // when more than the header is valid) belongs here, before anything is derived.
+    if ((HwInfoPrintLevel & GET_ADAPTER) != 0) {
+        DumpPciConfigSpace(config, length > static_cast<int>(PCI_HEADER_SIZE));
+    }
     std::memcpy(adapter->ConfigSpace, config, PCI_CONFIG_SIZE);
     adapter->HasBridge =
         config->HeaderType == HEADER_TYPE_BRIDGE || config->BaseClass == BASE_CLASS_BRIDGE;

@@ -3,7 +3,7 @@
 //
 // Input: the bytes the source delivered, at most one buffer's worth. Bit 0 of the header's
 // first reserved byte (ignored by the reader) switches every storing trace on, so that the
-// trace lines are formatted from the same bytes.
+// trace lines are formatted from the same bytes; bit 1 dumps the packet, raw and decoded, first.
 #include <sanitizer/asan_interface.h>
 
 #include <algorithm>
@@ -15,6 +15,7 @@
 #include "fuzz/fuzzsupport.h"
 #include "hw/aslstore.h"
 #include "hwobjects.h"
+#include "sources/asldump.h"
 
 namespace {
 
@@ -43,6 +44,11 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
     ASAN_POISON_MEMORY_REGION(bytes + delivered, sizeof(_ASL_PACKET) - delivered);
     if (delivered > sizeof(_ASL_TABLE_HEADER) && (Packet->Header.Reserved[0] & 1) != 0) {
         HwInfoPrintLevel = STORE_TRACES;
+    }
+    if (delivered > sizeof(_ASL_TABLE_HEADER) && (Packet->Header.Reserved[0] & 2) != 0) {
+        HwInfoPrintLevel |= RAW_ASL;
+        DumpRawAslPacket(Packet, delivered);
+        DumpAslPacket(Packet, delivered);
     }
 
     StoreAslTable(Packet, delivered);

@@ -1,5 +1,6 @@
 // A PCI function's configuration file (input, up to 4096 bytes): GetPciConfig's walk over the
-// file, StorePciConfig and GetCap over its image, and the image walk over the raw bytes.
+// file, StorePciConfig and GetCap over its image, and the image walk over the raw bytes. The
+// seeds: a header-only file, lists with an unknown item, a loop, and items at the image's end.
 #include <cstring>
 #include <string>
 

@@ -1,6 +1,5 @@
 // Writes the binary seed corpora: ASL packets for fuzz_aslstore, BIOS segment tails for
-// fuzz_vpd, query_module answers for fuzz_modquery and configuration files for fuzz_cfgspace. Run
-// by hand after changing it:
+// fuzz_vpd and query_module answers for fuzz_modquery. Run by hand after changing it:
 //   cmake --build build-fuzz --target make_seeds && build-fuzz/fuzz/make_seeds fuzz/corpus
 #include <sys/stat.h>
 
@@ -9,7 +8,6 @@
 #include <cstdio>
 #include <cstring>
 #include <string>
-#include <tuple>
 #include <vector>
 
 #include "adapters/linvpd.h"
@@ -54,9 +52,10 @@ AslBuilder Machine() {
 }
 
 std::vector<uint8_t> TracedMachine() {
-    // Bit 0 of the header's first reserved byte: the harness switches the traces on.
+    // Bits 0 and 1 of the header's first reserved byte: the harness switches the traces and
+    // the packet dumps on.
     std::vector<uint8_t> bytes = Machine().Bytes;
-    bytes[offsetof(_ASL_TABLE_HEADER, Reserved)] |= 1;
+    bytes[offsetof(_ASL_TABLE_HEADER, Reserved)] |= 3;
     return bytes;
 }
 
@@ -186,39 +185,6 @@ bool WriteModuleSeeds(const std::string& dir) {
     return ok;
 }
 
-// Configuration files: the capability bit and the given bytes set. Current kernels hand out
-// 4096 bytes, so items may reach past the image.
-bool WriteConfigSeeds(const std::string& dir) {
-    const std::tuple<const char*, size_t, std::vector<std::pair<int, int>>> seeds[] = {
-        {"header-only", 64, {{0x34, 0x40}}},
-        {"pm-msi64", 256, {{0x34, 0x40}, {0x40, 1}, {0x41, 0x50}, {0x50, 5}, {0x52, 0x80}}},
-        {"unknown-then-pcix", 256, {{0x34, 0x40}, {0x40, 9}, {0x41, 0x50}, {0x50, 7}}},
-        {"loop", 256, {{0x34, 0x40}, {0x40, 1}, {0x41, 0x48}, {0x48, 7}, {0x49, 0x40}}},
-        {"pcix-at-end", 4096, {{0x34, 0xF8}, {0xF8, 7}, {0xFE, 3}}},
-        {"msi-past-end", 4096, {{0x34, 0xF4}, {0xF4, 5}, {0xF6, 0x80}}}};
-    bool ok = true;
-    for (const auto& [name, size, set] : seeds) {
-        std::vector<uint8_t> bytes(size);
-        bytes[6] = 0x10;
-        for (auto [at, value] : set) {
-            bytes[at] = static_cast<uint8_t>(value);
-        }
-        ok &= Write(dir + "/" + name + ".bin", bytes);
-    }
-    return ok;
-}
-
-// Marker symbols for fuzz_naming (selector byte 2): a whole one, one without its two parts.
-bool WriteMarkerSeeds(const std::string& dir) {
-    const unsigned long names = 2 * sizeof(module_symbol);
-    const std::string whole = "__insmod_e1000_O/lib/modules/x/e1000.o_M1234_V2";
-    const std::string cut = "__insmod_e1000_O/lib/e1000.o";
-    std::vector<uint8_t> seed = SymbolAnswer(2, {names, names + whole.size() + 1},
-                                             whole + std::string(1, '\0') + cut + '\0');
-    seed.insert(seed.begin(), 2);
-    return Write(dir + "/markers.bin", seed);
-}
-
 }  // namespace
 
 int main(int argc, char** argv) {
@@ -228,7 +194,6 @@ int main(int argc, char** argv) {
     }
     const std::string corpus = argv[1];
     const bool ok = WriteAslSeeds(corpus + "/aslstore") && WriteVpdSeeds(corpus + "/vpd") &&
-                    WriteModuleSeeds(corpus + "/modquery") &&
-                    WriteMarkerSeeds(corpus + "/naming") && WriteConfigSeeds(corpus + "/cfgspace");
+                    WriteModuleSeeds(corpus + "/modquery");
     return ok ? 0 : 1;
 }

@@ -1,5 +1,8 @@
 #include "hw/adapterxref.h"
 
+#include "adapters/adapterdump.h"
+#include "diag/hwdebug.h"
+
 namespace {
 
 constexpr uint32_t NOT_USER_VISIBLE = NONE_BYTE;
@@ -72,8 +75,11 @@ void XRefSlotAdapter() {
         if (KeepAdapter(placement.InSlot, placement.BusHasSlots, adapter, &reason)) {
             continue;
         }
-        // The DUMP_DELETED_ADAPTERS report of the adapter and its reason belongs here, before
-        // the adapter is destroyed.
+        if ((HwInfoPrintLevel & DUMP_DELETED_ADAPTERS) != 0) {
+            dbgprint("\n");
+            dbgprint("Deleting Adapter  (%s)\n", reason);
+            DumpAdapter(adapter);
+        }
         AdapterList.Delete(adapter);
         delete adapter;
     }

@@ -2,16 +2,19 @@
 
 #include <memory>
 
+#include "adapters/adapterdump.h"
 #include "adapters/linadapt.h"
 #include "asl.h"
 #include "cardfile/cardfile.h"
 #include "cardfile/spclcase.h"
 #include "diag/hwdebug.h"
+#include "diag/hwdump.h"
 #include "hw/adapterxref.h"
 #include "hw/aslstore.h"
 #include "hw/busspeed.h"
 #include "hwobjects.h"
 #include "setup/linsetup.h"
+#include "sources/asldump.h"
 #include "sources/filetabl.h"
 #include "sources/linhw.h"
 #include "util/debuglevel.h"
@@ -30,6 +33,25 @@ void EmptyLists() {
     BusList.DestroyAll();
     SlotList.DestroyAll();
     AdapterList.DestroyAll();
+}
+
+// The dumps the debug level asks for once the lists are complete.
+void DumpResults() {
+    if ((HwInfoPrintLevel & DUMP_AGENT_STATS) != 0) {
+        DumpAgentStats(&AgentStatistics, L"After hardware collection");
+    }
+    if ((HwInfoPrintLevel & DUMP_SYSTEMS) != 0) {
+        DumpSystems();
+    }
+    if ((HwInfoPrintLevel & DUMP_BUSSES) != 0) {
+        DumpBusses();
+    }
+    if ((HwInfoPrintLevel & DUMP_SLOTS) != 0) {
+        DumpSlots();
+    }
+    if ((HwInfoPrintLevel & DUMP_ADAPTERS) != 0) {
+        DumpAdapters();
+    }
 }
 
 }  // namespace
@@ -68,6 +90,13 @@ bool GetHwInfo() {
         TraceAcquire("GetHwInfo():  using PCI architecture ASL\n");
     }
 
+    if ((HwInfoPrintLevel & RAW_ASL) != 0) {
+        DumpRawAslPacket(packet.get(), size);
+    }
+    if ((HwInfoPrintLevel & COOKED_ASL) != 0) {
+        DumpAslPacket(packet.get(), size);
+    }
+
     TraceAcquire("GetHwInfo():  storing PCI architecture table\n");
     StoreAslTable(packet.get(), size);
 
@@ -94,6 +123,7 @@ bool GetHwInfo() {
     SpecialCaseBusses();
     SpecialCaseSlots();
     SpecialCaseAdapters();
+    DumpResults();
     StopHwInfo();
     return true;
 }

@@ -11,6 +11,7 @@
 #include "adapters/modquery.h"
 #include "asl.h"
 #include "diag/hwdebug.h"
+#include "diag/hwdump.h"
 #include "filehandle.h"
 #include "sources/linhw.h"
 #include "sources/pcifile.h"
@@ -187,6 +188,9 @@ bool FieldNumber(const char* field, uint32_t* value) {
 void SetupVelhSlot() {
     AgentStatistics.AgentVersion = AGENT_VERSION;
     CheckPreRequisites(&AgentStatistics.PreReqError);
+    if ((HwInfoPrintLevel & TRACE_PREREQ_CHECK) != 0) {
+        DumpAgentStats(&AgentStatistics, L"After setup");
+    }
 }
 
 bool CheckPreRequisites(uint32_t* preReqError) {

@@ -8,6 +8,8 @@
 #include <cstdint>
 #include <string>
 
+#include "agentstats.h"
+
 constexpr const wchar_t* AGENT_VERSION = L"4.20";
 
 // Prerequisite error codes, in the order the checks produce them.
@@ -19,10 +21,6 @@ constexpr uint32_t PREREQ_OS_VENDOR = 8;
 constexpr uint32_t PREREQ_OS_PRODUCT = 9;
 constexpr uint32_t PREREQ_KERNEL_VERSION = 10;
 
-struct _AgentStats {
-    std::wstring AgentVersion;
-    uint32_t PreReqError = 0;
-};
 extern _AgentStats AgentStatistics;
 
 // Supported distributions: parallel tables of release-file name, vendor word and product word.

@@ -1,6 +1,6 @@
 // velhsim: runs a command against a described machine.
 //
-//   velhsim --machine DIR [--run-dir RUN] -- COMMAND [ARG...]
+//   velhsim [--i386] --machine DIR [--run-dir RUN] -- COMMAND [ARG...]
 //
 // The machine folder is copied into the run folder, and the command runs there, in RUN/install,
 // in private namespaces in which the run folder's machine replaces the real one. Its status is
@@ -30,15 +30,24 @@ using namespace velhsim;
 
 constexpr int LAUNCHER_FAILED = 125;
 constexpr const char* PRELOAD_LIBRARY = "libvelhsim-preload.so";
+// A 32-bit command runs under qemu's user-mode emulator, and the programs it starts may be 64-bit
+// (slotwatch, killall, a shell). The dynamic loader expands $LIB to the library folder of its own
+// architecture (Debian's multiarch names), so one LD_PRELOAD entry gives each process the
+// emulation built for it; the build lays out both architectures' copies in these folders.
+constexpr const char* PRELOAD_BY_ARCHITECTURE = "$LIB/libvelhsim-preload.so";
+constexpr const char* I386_PRELOAD = "lib/i386-linux-gnu/libvelhsim-preload.so";
+constexpr const char* I386_EMULATOR = "qemu-i386";
 
 const char* const USAGE =
-    "usage: velhsim --machine DIR [--run-dir RUN] -- COMMAND [ARG...]\n"
+    "usage: velhsim [--i386] --machine DIR [--run-dir RUN] -- COMMAND [ARG...]\n"
     "Copies the machine folder DIR into the run folder RUN (a new temporary folder when not\n"
-    "given) and runs COMMAND in RUN/install against that machine.\n";
+    "given) and runs COMMAND in RUN/install against that machine; with --i386, a 32-bit\n"
+    "COMMAND under qemu-i386.\n";
 
 struct Options {
     std::string Machine;
     std::string RunDir;
+    bool I386 = false;
     std::vector<std::string> Command;
 };
 
@@ -65,6 +74,10 @@ std::optional<Options> ParseOptions(int argc, char** argv, std::string* error) {
     Options options;
     int i = 1;
     for (; i < argc && std::strcmp(argv[i], "--") != 0; ++i) {
+        if (std::strcmp(argv[i], "--i386") == 0) {
+            options.I386 = true;
+            continue;
+        }
         if (!TakeValue("--machine", argc, argv, &i, &options.Machine) &&
             !TakeValue("--run-dir", argc, argv, &i, &options.RunDir)) {
             *error = std::string("unknown option ") + argv[i];
@@ -98,6 +111,26 @@ std::string ToolFolder() {
     return std::filesystem::path(path).parent_path().string();
 }
 
+// The program as execvp would find it: a name without "/" along PATH; empty when there is none.
+std::string FindProgram(const std::string& name) {
+    if (name.find('/') != std::string::npos) {
+        return access(name.c_str(), X_OK) == 0 ? name : std::string();
+    }
+    const char* path = std::getenv("PATH");
+    std::string folders = path != nullptr ? path : "/usr/bin:/bin";
+    for (size_t start = 0; start <= folders.size();) {
+        size_t end = folders.find(':', start);
+        end = end == std::string::npos ? folders.size() : end;
+        const std::string folder = end > start ? folders.substr(start, end - start) : ".";
+        const std::string candidate = JoinPath(folder, name);
+        if (IsRegularFile(candidate) && access(candidate.c_str(), X_OK) == 0) {
+            return candidate;
+        }
+        start = end + 1;
+    }
+    return std::string();
+}
+
 void SetEnvironment(const std::string& run, const std::string& machine, const std::string& origin,
                     const std::string& preload) {
     setenv("VELHSIM_RUN", run.c_str(), 1);
@@ -112,12 +145,34 @@ void SetEnvironment(const std::string& run, const std::string& machine, const st
 int Run(const Options& options) {
     const std::string origin = Absolute(".");
     const std::string toolDir = ToolFolder();
-    const std::string preload = JoinPath(toolDir, PRELOAD_LIBRARY);
     const std::string machine = Absolute(options.Machine);
     std::string run = options.RunDir.empty() ? std::string() : Absolute(options.RunDir);
     std::string error;
-    if (!IsRegularFile(preload)) {
-        return Fail("the preload library " + preload + " is not built");
+    for (const std::string& library : options.I386
+                                          ? std::vector<std::string>{PRELOAD_LIBRARY, I386_PRELOAD}
+                                          : std::vector<std::string>{PRELOAD_LIBRARY}) {
+        if (!IsRegularFile(JoinPath(toolDir, library))) {
+            return Fail("the preload library " + JoinPath(toolDir, library) + " is not built");
+        }
+    }
+    const std::string preload =
+        JoinPath(toolDir, options.I386 ? PRELOAD_BY_ARCHITECTURE : PRELOAD_LIBRARY);
+    std::vector<std::string> command = options.Command;
+    if (options.I386) {
+        const std::string emulator = FindProgram(I386_EMULATOR);
+        if (emulator.empty()) {
+            return Fail(std::string(I386_EMULATOR) + " is not installed (package qemu-user)");
+        }
+        // The emulator opens the program by its path; it does not search PATH.
+        const std::string program = FindProgram(command.front());
+        if (program.empty()) {
+            std::fprintf(stderr, "velhsim: cannot run %s: %s\n", command.front().c_str(),
+                         std::strerror(ENOENT));
+            return 127;
+        }
+        command.front() = program;
+        // -L /: the guest's libraries are the system's own (i386 multiarch).
+        command.insert(command.begin(), {emulator, "-L", "/"});
     }
     if (!IsDirectory(machine)) {
         return Fail("no machine folder " + machine);
@@ -147,7 +202,7 @@ int Run(const Options& options) {
         return Fail(error);
     }
     const std::string install = JoinPath(run, "install");
-    const std::vector<std::string> command = ResolveArguments(options.Command, origin, install);
+    command = ResolveArguments(command, origin, install);
     SetEnvironment(run, machine, origin, preload);
     if (processNamespace) {
         const pid_t first = ForkIntoProcessNamespace();

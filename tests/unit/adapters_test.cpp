@@ -58,31 +58,6 @@ TEST(CapabilityWalk, ReadsKnownItemsWithinTheImageAndDerivesPciX) {
     EXPECT_NE(tree.Log().find("item at 0xf4 reaches past"), std::string::npos);
 }
 
-TEST(StorePciConfig, BridgesLeaveTheirSubsystemOutOfPciId) {
-    // Header type, base class, bridge.
-    for (auto [type, base, bridge] : {std::tuple{0x00, 2, false},
-                                      {0x01, 6, true},
-                                      {0x81, 6, true},
-                                      {0x81, 2, false},
-                                      {0x02, 7, false}}) {
-        const std::string image = Config(256, 0,
-                                         {{0, 0x34},
-                                          {1, 0x12},
-                                          {2, 0xcd},
-                                          {3, 0xab},
-                                          {8, 1},
-                                          {0x2c, 0x55},
-                                          {0x2d, 0x55},
-                                          {0x2e, 1},
-                                          {0x0b, base},
-                                          {0x0e, type}});
-        AdapterDescriptor adapter;
-        StorePciConfig(Image(image), &adapter, 64);
-        EXPECT_EQ(adapter.HasBridge, bridge) << type;
-        EXPECT_EQ(adapter.PciId, bridge ? L"1234abcd0000000001" : L"1234abcd5555000101") << type;
-    }
-}
-
 TEST(ProcBusPci, BusFoldersAndFunctionFiles) {
     _FILE_ATTRIBS entry{};
     uint32_t device = 0;
@@ -100,44 +75,24 @@ TEST(ProcBusPci, BusFoldersAndFunctionFiles) {
     }
 }
 
-TEST(XRefSlotAdapter, KeepsSlotAndOnBoardAdaptersOfBussesWithVisibleSlots) {
-    // Bus 3: device 2 in slot 5 (power code 1), a hidden slot; bus 4: a hidden slot only.
-    SlotList.Add(new SlotDescriptor{
-        .SlotID = 5, .BusNum = 3, .DevNum = 2, .FriendlyNum = 4, .Status = 1 << 3});
-    SlotList.Add(new SlotDescriptor{.SlotID = 6, .BusNum = 3, .DevNum = 4, .FriendlyNum = 255});
-    SlotList.Add(new SlotDescriptor{.SlotID = 7, .BusNum = 4, .DevNum = 1, .FriendlyNum = 255});
-    // Bus, device, on board, bridge, reason for removal.
-    const std::tuple<uint32_t, uint32_t, bool, bool, const wchar_t*> cases[] = {
-        {3, 2, true, true, L""},
-        {3, 9, true, false, L""},
-        {3, 9, true, true, L"Device is an onboard bridge"},
-        {3, 9, false, false, L"Device is under a bridge on a card"},
-        {4, 1, true, false, L"Device is on a bus without slots"},
-        {8, 0, true, false, L"Device is on a bus without slots"}};
-    for (const auto& [bus, device, onBoard, bridge, why] : cases) {
-        auto* adapter = new AdapterDescriptor;
-        adapter->Bus = bus;
-        adapter->Device = device;
-        adapter->HasBridge = bridge;
-        adapter->OnBoard = onBoard && device != 2;  // as placed: in a slot is not on board
+TEST(KeepAdapter, RemovesCardBridgedAndSlotlessFunctionsAndOnBoardBridges) {
+    // In a slot, bus with visible slots, on board, bridge, reason for removal.
+    for (auto [inSlot, busHasSlots, onBoard, bridge, why] :
+         {std::tuple{true, true, false, true, L""},
+          {false, true, true, false, L""},
+          {false, true, true, true, L"Device is an onboard bridge"},
+          {false, true, false, false, L"Device is under a bridge on a card"},
+          {true, false, false, false, L"Device is on a bus without slots"}}) {
+        AdapterDescriptor adapter;
+        adapter.OnBoard = onBoard;
+        adapter.HasBridge = bridge;
         const wchar_t* reason = nullptr;
-        EXPECT_EQ(KeepAdapter(device == 2, bus == 3, adapter, &reason), *why == L'\0');
+        EXPECT_EQ(KeepAdapter(inSlot, busHasSlots, &adapter, &reason), *why == L'\0');
         EXPECT_STREQ(reason, why);
-        adapter->OnBoard = onBoard;
-        AdapterList.Add(adapter);
     }
-    XRefSlotAdapter();
-    std::vector<std::vector<uint32_t>> kept;  // SlotID, PowerReq, FriendlyNum, OnBoard
-    AdapterList.BeginEnumeration();
-    while (const AdapterDescriptor* a = AdapterList.Next()) {
-        kept.push_back({a->SlotID, a->PowerReq, a->FriendlyNum, a->OnBoard});
-    }
-    EXPECT_EQ(kept,
-              (std::vector<std::vector<uint32_t>>{{NONE_VALUE, 0, NONE_VALUE, 1}, {5, 15, 4, 0}}));
-    AdapterList.DestroyAll();
-    SlotList.DestroyAll();
-    EXPECT_EQ(std::vector({SlotPowerReq(0x07), SlotPowerReq(0x10), SlotPowerReq(0x18)}),
-              std::vector({8u, 25u, 0u}));
+    EXPECT_EQ(std::vector(
+                  {SlotPowerReq(0x07), SlotPowerReq(0x08), SlotPowerReq(0x10), SlotPowerReq(0x18)}),
+              std::vector({8u, 15u, 25u, 0u}));
 }
 
 TEST(DeriveCurrentBusSpeeds, SettlesOnTheFastestStepThatCarriesTheLoad) {

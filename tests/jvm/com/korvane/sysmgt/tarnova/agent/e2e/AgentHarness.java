@@ -34,7 +34,9 @@ import java.util.stream.Stream;
  * machine folders in the source tree stay as they are.
  *
  * <p>Needs the system properties velh.build.dir, velh.agent.jar and velh.test.jar, and for
- * {@link #sampleMachine} velh.machines.dir.
+ * {@link #sampleMachine} velh.machines.dir. With velh.i386.java (a 32-bit JVM's java) the agent
+ * runs in that JVM under qemu-i386 (velhsim --i386 with a machine), loading the 32-bit library
+ * of velh.build.dir, and the simulator comes from the 64-bit build velh.sim.build.dir.
  */
 public final class AgentHarness {
     public static final String AGENT_CLASS = "com.korvane.sysmgt.tarnova.agent.TarnovaAgent";
@@ -43,6 +45,8 @@ public final class AgentHarness {
 
     private final Path base;
     private final Path buildDir = Path.of(property("velh.build.dir"));
+    private String i386Java = System.getProperty("velh.i386.java", "");
+    private Path libraryDir = buildDir;
     private final String classPath =
         property("velh.agent.jar") + File.pathSeparator + property("velh.test.jar");
     private boolean jniLog;
@@ -93,6 +97,13 @@ public final class AgentHarness {
     /** Runs the JVM under the simulator against a machine folder. */
     public AgentHarness onMachine(Path machineFolder) {
         machine = machineFolder;
+        return this;
+    }
+
+    /** Runs the 64-bit JVM and library of velh.sim.build.dir, to compare a 32-bit run with. */
+    public AgentHarness on64Bit() {
+        i386Java = "";
+        libraryDir = Path.of(property("velh.sim.build.dir"));
         return this;
     }
 
@@ -155,15 +166,19 @@ public final class AgentHarness {
                 edit.apply(machineCopy);
             }
             setJniLog(machineCopy.resolve("log"));
-            command.addAll(List.of(buildDir.resolve("sim/velhsim").toString(), "--machine",
-                machineCopy.toString(), "--run-dir", run.toString(), "--"));
+            String sim = System.getProperty("velh.sim.build.dir", buildDir.toString());
+            command.addAll(List.of(Path.of(sim, "sim/velhsim").toString(), "--machine",
+                machineCopy.toString(), "--run-dir", run.toString()));
+            command.addAll(i386Java.isEmpty() ? List.of("--") : List.of("--i386", "--"));
         } else {
             Files.createDirectories(run.resolve("install"));
             setJniLog(Files.createDirectories(run.resolve("log")));
+            command.addAll(i386Java.isEmpty() ? List.of() : List.of("qemu-i386", "-L", "/"));
         }
-        command.add(Path.of(System.getProperty("java.home"), "bin", "java").toString());
+        command.add(i386Java.isEmpty()
+            ? Path.of(System.getProperty("java.home"), "bin", "java").toString() : i386Java);
         command.addAll(jvmOptions);
-        command.add("-Djava.library.path=" + buildDir);
+        command.add("-Djava.library.path=" + libraryDir);
         command.add("-cp");
         command.add(classPath);
         command.add(mainClass);
@@ -180,9 +195,11 @@ public final class AgentHarness {
         env.putAll(environment);
 
         Process process = builder.start();
-        if (!process.waitFor(TIMEOUT_SECONDS, TimeUnit.SECONDS)) {
+        // qemu runs the 32-bit JVM several times slower.
+        long timeout = i386Java.isEmpty() ? TIMEOUT_SECONDS : 5 * TIMEOUT_SECONDS;
+        if (!process.waitFor(timeout, TimeUnit.SECONDS)) {
             process.destroyForcibly().waitFor();
-            throw new IllegalStateException("the JVM did not end within " + TIMEOUT_SECONDS
+            throw new IllegalStateException("the JVM did not end within " + timeout
                 + " s: " + String.join(" ", command));
         }
         return new Result(root, run, process.exitValue());
@@ -207,7 +224,7 @@ public final class AgentHarness {
         Files.setPosixFilePermissions(script, PosixFilePermissions.fromString("rwxr-xr-x"));
     }
 
-    private static void copyTree(Path from, Path to) throws IOException {
+    static void copyTree(Path from, Path to) throws IOException {
         try (Stream<Path> paths = Files.walk(from)) {
             for (Path path : (Iterable<Path>) paths::iterator) {
                 Path target = to.resolve(from.relativize(path).toString());

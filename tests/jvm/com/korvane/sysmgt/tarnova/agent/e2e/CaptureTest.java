@@ -20,15 +20,14 @@ class CaptureTest {
     Path temp;
 
     private void capture(Path folder, String... simulator) throws Exception {
-        Files.createDirectories(folder);
         List<String> command = new ArrayList<>(List.of(simulator));
         Path machines = Path.of(AgentHarness.property("velh.machines.dir"));
-        command.add(machines.resolveSibling("capture").toString());
-        command.add(folder.toString());
+        command.addAll(List.of(machines.resolveSibling("capture").toString(), folder.toString()));
+        Path out = temp.resolve("capture.out");
         ProcessBuilder builder = new ProcessBuilder(command).directory(temp.toFile())
-            .redirectErrorStream(true).redirectOutput(temp.resolve("capture.out").toFile());
+            .redirectErrorStream(true).redirectOutput(out.toFile());
         builder.environment().put("VELHSIM_BUILD_DIR", buildDir);
-        assertEquals(0, builder.start().waitFor(), () -> read(temp.resolve("capture.out")));
+        assertEquals(0, builder.start().waitFor(), Files.readString(out));
     }
 
     private Map<String, Object> json(Path machine) {
@@ -39,20 +38,20 @@ class CaptureTest {
 
     @Test
     void thisMachineReplaysUnderTheSimulator() throws Exception {
-        Path here = temp.resolve("here");
-        capture(here);
-        json(here);
-        assertTrue(read(here.resolve("CAPTURED.txt")).contains("captured: kernel release "));
+        capture(temp.resolve("here"));
+        json(temp.resolve("here"));
+        String captured = Files.readString(temp.resolve("here/CAPTURED.txt"));
+        assertTrue(captured.contains("captured: kernel release "), captured);
     }
 
     @Test
     void aSimulatedMachineComesBackWithItsFunctionsDriverAndInventories() throws Exception {
         Path sample = AgentHarness.sampleMachine("chassis-drawer");
-        Path copy = temp.resolve("copy");
+        Path copy = Files.createDirectory(temp.resolve("copy"));
         Path run = temp.resolve("run");
         capture(copy, buildDir + "/sim/velhsim", "--machine", sample.toString(), "--run-dir",
             run.toString(), "--");
-        assertEquals("1.0.0\n", read(copy.resolve("driver/version")));
+        assertEquals("1.0.0\n", Files.readString(copy.resolve("driver/version")));
         try (Stream<Path> files = Stream.concat(Files.walk(run.resolve("proc")),
                  Stream.of(run.resolve("driver/asl.bin"), run.resolve("etc/SuSE-release")))) {
             for (Path file : (Iterable<Path>) files.filter(Files::isRegularFile)::iterator) {
@@ -60,19 +59,11 @@ class CaptureTest {
                 assertEquals(-1L, Files.mismatch(file, captured), file::toString);
             }
         }
-        // The modules of the sample are not the build machine's, so only the status may differ.
-        Map<String, Object> original = json(sample);
-        Map<String, Object> replayed = json(copy);
-        for (String kind : List.of("systems", "busses", "slots", "adapters")) {
-            assertEquals(original.get(kind), replayed.get(kind), kind);
+        // Under the simulator the modules are seen by query_module only, and the install folder
+        // is no part of a capture: with both, the replay is the sample.
+        for (String part : List.of("install", "modules")) {
+            AgentHarness.copyTree(sample.resolve(part), copy.resolve(part));
         }
-    }
-
-    private static String read(Path file) {
-        try {
-            return Files.readString(file);
-        } catch (java.io.IOException e) {
-            return e.toString();
-        }
+        assertEquals(json(sample), json(copy));
     }
 }

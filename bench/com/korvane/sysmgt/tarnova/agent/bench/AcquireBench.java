@@ -1,3 +1,5 @@
+package com.korvane.sysmgt.tarnova.agent.bench;
+
 import com.korvane.sysmgt.tarnova.agent.TarnovaAgent;
 import java.lang.management.ManagementFactory;
 import java.lang.management.ThreadMXBean;
@@ -9,7 +11,8 @@ import java.util.Arrays;
  * Prints the medians in milliseconds (acquisition also as the calling thread's processor time)
  * and the number of adapters and slots the last acquisition reported.
  *
- * <p>java -cp tarnova-agent.jar:CLASSES AcquireBench WARMUP ROUNDS
+ * <p>java -cp tarnova-agent.jar:velh-acquire.jar com.korvane.sysmgt.tarnova.agent.bench.AcquireBench
+ * WARMUP ROUNDS
  */
 public final class AcquireBench {
     private AcquireBench() {}
