@@ -290,6 +290,10 @@ int ParseLine(char* line) {
         char written[CARD_LINE_CHARS];
         std::snprintf(written, sizeof written, "%s", token);
         _strlwr(token);
+        // The state is a global that anyone may have set: outside a record it starts one.
+        if (ParseState < FIELD_NAME || ParseState > FIELD_DRIVER) {
+            ParseState = FIELD_NAME;
+        }
 
         const bool isName = IsAdapterName(token);
         if (isName) {
