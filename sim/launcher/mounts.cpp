@@ -245,14 +245,21 @@ bool PrivateTemporaryFolders(const std::string& run, const std::vector<std::stri
                              std::string* error) {
     std::vector<std::string> paths;
     for (const std::string& path : reachable) {
-        std::error_code code;
-        std::filesystem::path real = std::filesystem::weakly_canonical(path, code);
-        // A file is shown with its folder.
-        if (!code && !IsDirectory(real.string())) {
-            real = real.parent_path();
+        // A file is shown with its folder; a link with the folder that holds it as well as with
+        // the folder of what it points to.
+        std::vector<std::filesystem::path> shown{path};
+        if (!IsDirectory(path)) {
+            shown = {std::filesystem::path(path).parent_path(), path};
         }
-        if (!code && InTemporaryFolder(real.string())) {
-            paths.push_back(real.string());
+        for (const std::filesystem::path& candidate : shown) {
+            std::error_code code;
+            std::filesystem::path real = std::filesystem::weakly_canonical(candidate, code);
+            if (!code && !IsDirectory(real.string())) {
+                real = real.parent_path();
+            }
+            if (!code && InTemporaryFolder(real.string())) {
+                paths.push_back(real.string());
+            }
         }
     }
     // Shortest first, and none inside another: binding the outer brings the inner along.
