@@ -3,9 +3,6 @@
 #include <gtest/gtest.h>
 #include <sys/stat.h>
 
-#include <string>
-#include <vector>
-
 #include "sim/machine/firmware.h"
 #include "sim/machine/lspcidump.h"
 #include "sim/machine/pcitree.h"
@@ -19,6 +16,11 @@ using ::testing::HasSubstr;
 std::string Row(const std::string& offset, const std::string& bytes) {
     return offset + ": " + bytes + "\n";
 }
+
+struct Refusal {
+    std::string Text;
+    std::string Message;
+};
 
 const std::string ZERO_ROW = "00 00 00 00 00 00 00 00 00 00 00 00 00 00 00 00";
 
@@ -43,26 +45,14 @@ TEST(LspciDump, ReadsFunctionsDetailsAndExactlyTheDumpedBytes) {
     std::string error;
     ASSERT_TRUE(ParseLspciDump(text, &functions, &error)) << error;
     ASSERT_EQ(functions.size(), 2u);
-    const PciFunctionDump& scsi = functions[0];
-    EXPECT_EQ(scsi.Bus, 2u);
-    EXPECT_EQ(scsi.Device, 0x1fu);
-    EXPECT_EQ(scsi.Function, 3u);
-    EXPECT_EQ(scsi.Config.size(), 66u);
-    EXPECT_EQ(static_cast<unsigned char>(scsi.Config[65]), 0xbb);
-    EXPECT_EQ(scsi.Driver, "aic7xxx");
-    EXPECT_EQ(scsi.Irq, 24u);
-    EXPECT_EQ(scsi.RegionSizes[0], 256u << 20);
-    EXPECT_EQ(scsi.RegionSizes[4], 256u);
-    EXPECT_EQ(scsi.RegionSizes[PCI_ROM_RESOURCE], 128u << 10);
-    // The IRQ the kernel routed wins over the configuration's line; the upper half of the 64-bit
-    // base address takes no slot; the ROM shows without its flag bits.
-    EXPECT_EQ(DevicesLine(scsi),
+    // Exactly the dumped bytes. The IRQ the kernel routed wins over the configuration's line; the
+    // upper half of the 64-bit base address takes no slot; the ROM shows without its flag bits.
+    EXPECT_EQ(functions[0].Config.substr(62), "\x27\x19\xaa\xbb");
+    EXPECT_EQ(DevicesLine(functions[0]),
               "02fb\t900500cf\t18\tfe00000c\t00000000\t00000000\t00000000\t00002f01\t00000000"
               "\tfc900000\t10000000\t00000000\t00000000\t00000000\t00000100\t00000000\t00020000"
               "\taic7xxx\n");
-    EXPECT_EQ(functions[1].Domain, 1u);
-    EXPECT_EQ(functions[1].Bus, 0x10u);
-    EXPECT_EQ(functions[1].Config, std::string("\x86\x80\x10\x10"));
+    EXPECT_EQ(functions[1].Config, "\x86\x80\x10\x10");
 }
 
 TEST(LspciDump, DevicesLineOfABridgeWithoutDriverOrInterrupt) {
@@ -86,11 +76,7 @@ TEST(LspciDump, DevicesLineOfABridgeWithoutDriverOrInterrupt) {
 }
 
 TEST(LspciDump, RefusesWhatIsNoDumpNamingTheLine) {
-    struct Case {
-        std::string Text;
-        std::string Message;
-    };
-    const std::vector<Case> cases = {
+    const Refusal cases[] = {
         {Row("00", "86 80"), "line 1: configuration bytes before the first function"},
         {"00:01.0 x\n" + Row("10", ZERO_ROW), "line 2: row 10: does not continue"},
         {"00:01.0 x\n" + Row("00", "86 80") + Row("10", "00"), "line 3: row 10: does not"},
@@ -105,7 +91,7 @@ TEST(LspciDump, RefusesWhatIsNoDumpNamingTheLine) {
          "line 2: unreadable region size"},
         {"\tKernel driver in use: e1000\n", "line 1: detail line before the first function"},
     };
-    for (const Case& c : cases) {
+    for (const Refusal& c : cases) {
         std::vector<PciFunctionDump> functions;
         std::string error;
         EXPECT_FALSE(ParseLspciDump(c.Text, &functions, &error)) << c.Text;
@@ -191,11 +177,7 @@ TEST(Firmware, BuildsASparseImageWithTheSegmentAtF0000) {
 }
 
 TEST(Firmware, RefusesDescriptionsItCannotHonour) {
-    struct Case {
-        std::string Text;
-        std::string Message;
-    };
-    const std::vector<Case> cases = {
+    const Refusal cases[] = {
         {"type K740\n", "line 1: \"type\" before the first \"record\" line"},
         {"record 0x10000\n", "line 1: the record's offset must be a number below"},
         {"record 0\ntype K7401\n", "line 2: type has at most 4 characters"},
@@ -203,7 +185,7 @@ TEST(Firmware, RefusesDescriptionsItCannotHonour) {
         {"record 0\nlength 256\n", "line 2: length must be a number from 0 to 255"},
         {"record 0\ncolour red\n", "line 2: unknown key \"colour\""},
     };
-    for (const Case& c : cases) {
+    for (const Refusal& c : cases) {
         FirmwareDescription firmware;
         std::string error;
         EXPECT_FALSE(ParseFirmware(c.Text, &firmware, &error)) << c.Text;
