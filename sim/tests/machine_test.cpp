@@ -3,6 +3,8 @@
 #include <gtest/gtest.h>
 #include <sys/stat.h>
 
+#include <numeric>
+
 #include "sim/machine/firmware.h"
 #include "sim/machine/lspcidump.h"
 #include "sim/machine/pcitree.h"
@@ -56,20 +58,17 @@ TEST(LspciDump, ReadsFunctionsDetailsAndExactlyTheDumpedBytes) {
 }
 
 TEST(LspciDump, DevicesLineOfABridgeWithoutDriverOrInterrupt) {
-    PciFunctionDump bridge;
-    bridge.Bus = 3;
-    bridge.Device = 2;
-    bridge.Config = std::string(64, '\0');
-    bridge.Config[0] = '\x11';
-    bridge.Config[1] = '\x10';
-    bridge.Config[2] = '\x26';
-    bridge.Config[0x0e] = '\x01';                                        // header type 1
-    bridge.Config[0x10] = '\x01';                                        // an I/O base address
-    bridge.Config[0x14] = '\x10';                                        // ...and a memory one
-    bridge.Config[0x30] = '\x55';                                        // not the ROM for type 1
-    bridge.Config.replace(0x38, 4, std::string("\x01\x00\xf0\xfe", 4));  // ROM at 0xfef00000, on
-    bridge.Config[0x3c] = '\x0a';                                        // a line but no pin
-    EXPECT_EQ(DevicesLine(bridge),
+    // Header type 1, an I/O and a memory base address, 0x30 that is no ROM for this type, the ROM
+    // at 0xfef00000 and on, a line but no pin.
+    std::vector<PciFunctionDump> bridge;
+    std::string error;
+    ASSERT_TRUE(ParseLspciDump(
+        "03:02.0 x\n" + Row("00", "11 10 26 00 00 00 00 00 00 00 00 00 00 00 01 00") +
+            Row("10", "01 00 00 00 10 00 00 00 00 00 00 00 00 00 00 00") + Row("20", ZERO_ROW) +
+            Row("30", "55 00 00 00 00 00 00 00 01 00 f0 fe 0a 00 00 00"),
+        &bridge, &error))
+        << error;
+    EXPECT_EQ(DevicesLine(bridge[0]),
               "0310\t10110026\t0\t00000001\t00000010\t00000000\t00000000\t00000000\t00000000"
               "\tfef00001\t00000000\t00000000\t00000000\t00000000\t00000000\t00000000\t00000000"
               "\t\n");
@@ -126,11 +125,10 @@ TEST(Firmware, EncodesTheRecordWithPaddedTextsAndAChecksum) {
     ASSERT_EQ(bytes.size(), 48u);
     EXPECT_EQ(bytes.substr(0, 6), std::string("\xaa\x55VPD\x30"));
     EXPECT_EQ(bytes.substr(13, 34), "KVD140AKVK7D04122303A4B5C6DK740C4 ");
-    unsigned sum = 0;
-    for (unsigned char byte : bytes) {
-        sum += byte;
-    }
-    EXPECT_EQ(sum % 256, 0u);
+    EXPECT_EQ(std::accumulate(bytes.begin(), bytes.end(), 0,
+                              [](int sum, unsigned char byte) { return sum + byte; }) %
+                  256,
+              0);
 
     record.Signature = "XYZ";
     record.Length = 0x21;
@@ -146,22 +144,11 @@ TEST(Firmware, BuildsASparseImageWithTheSegmentAtF0000) {
     segment[0] = 'S';
     segment[0xffff] = 'E';
     dir.Write("bios.bin", segment);
+    // Two records and a captured segment; the last record is cut at the segment's end.
     dir.Write("firmware",
-              "# two records and a captured segment\n"
-              "segment bios.bin\n"
-              "record 0x100\n"
-              "type K740 # the machine type\n"
-              "model \"C4 \"\n"
-              "record 0xFFE0  // the last one is cut at the segment's end\n"
-              "type 1234\n");
+              "# comment\nsegment bios.bin\nrecord 0x100\ntype K740 # the machine type\n"
+              "model \"C4 \"\nrecord 0xFFE0\ntype 1234\n");
     std::string error;
-    // The comment mark of this format is "#", so "//" makes the offset unreadable.
-    EXPECT_FALSE(BuildMemoryImage(dir / "firmware", dir / "mem", &error));
-    EXPECT_THAT(error, HasSubstr("line 6: the record's offset must be a number"));
-
-    dir.Write("firmware",
-              "segment bios.bin\nrecord 0x100\ntype K740 # the machine type\nmodel \"C4 \"\n"
-              "record 0xFFE0\ntype 1234\n");
     ASSERT_TRUE(BuildMemoryImage(dir / "firmware", dir / "mem", &error)) << error;
     const std::string image = FileText(dir / "mem");
     ASSERT_EQ(image.size(), MEMORY_IMAGE_SIZE);
@@ -180,23 +167,22 @@ TEST(Firmware, RefusesDescriptionsItCannotHonour) {
     const Refusal cases[] = {
         {"type K740\n", "line 1: \"type\" before the first \"record\" line"},
         {"record 0x10000\n", "line 1: the record's offset must be a number below"},
+        // The comment mark of this format is "#", so "//" makes the offset unreadable.
+        {"#\nrecord 0xFFE0  // at the end\n", "line 2: the record's offset must be a number"},
         {"record 0\ntype K7401\n", "line 2: type has at most 4 characters"},
         {"record 0\nmodel \"C4D\n", "line 2: unbalanced quote"},
         {"record 0\nlength 256\n", "line 2: length must be a number from 0 to 255"},
         {"record 0\ncolour red\n", "line 2: unknown key \"colour\""},
+        {"segment short.bin\n", "a captured segment holds exactly 65536 bytes"},
     };
+    const ScratchDir dir;
+    dir.Write("short.bin", "abc");
     for (const Refusal& c : cases) {
-        FirmwareDescription firmware;
+        dir.Write("firmware", c.Text);
         std::string error;
-        EXPECT_FALSE(ParseFirmware(c.Text, &firmware, &error)) << c.Text;
+        EXPECT_FALSE(BuildMemoryImage(dir / "firmware", dir / "mem", &error)) << c.Text;
         EXPECT_THAT(error, HasSubstr(c.Message)) << c.Text;
     }
-    const ScratchDir dir;
-    dir.Write("firmware", "segment short.bin\n");
-    dir.Write("short.bin", "abc");
-    std::string error;
-    EXPECT_FALSE(BuildMemoryImage(dir / "firmware", dir / "mem", &error));
-    EXPECT_THAT(error, HasSubstr("a captured segment holds exactly 65536 bytes"));
 }
 
 }  // namespace
