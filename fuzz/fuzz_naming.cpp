@@ -19,11 +19,8 @@ static std::string PlainLookup(const std::string& text, const char keys[4][5]) {
         end = std::min(text.find('\n', start), text.size());
         std::string copy = text.substr(start, std::min<size_t>(end - start, 1023));
         char* line = copy.data();
-        if (TrimComment(line, "#") == 0) {
-            continue;
-        }
-        int indent = TrimIndent(line);
-        if (*line == '\0' || indent > 2 || (indent > 0 && found[indent - 1].empty())) {
+        const int indent = TrimComment(line, "#") == 0 ? 3 : TrimIndent(line);
+        if (indent > 2 || *line == '\0' || (indent > 0 && found[indent - 1].empty())) {
             continue;
         }
         if (indent < 2 && !found[indent].empty()) {

@@ -32,22 +32,16 @@ int FakeQueryModule(const char*, int which, void* buffer, size_t size, size_t* r
 void AnchorPaths(int* argc, char*** argv, const std::string& directory) {
     static std::vector<std::string> arguments(*argv, *argv + *argc);
     static std::vector<char*> anchored;
-    bool prefixGiven = false;
-    for (size_t i = 1; i < arguments.size(); i++) {
-        std::string& argument = arguments[i];
+    // libFuzzer takes the last of a repeated flag: a prefix given by the caller wins over this.
+    arguments.insert(arguments.begin() + 1, "-artifact_prefix=" + directory + "/");
+    for (std::string& argument : arguments) {
         size_t at = argument.empty() || argument[0] != '-' ? 0 : std::string::npos;
         for (const char* flag : {"-artifact_prefix=", "-exact_artifact_path=", "-dict="}) {
             at = argument.rfind(flag, 0) == 0 ? std::strlen(flag) : at;
         }
-        prefixGiven = prefixGiven || argument.rfind("-artifact_prefix=", 0) == 0;
-        if (at < argument.size() && argument[at] != '/') {
+        if (&argument != &arguments[0] && at < argument.size() && argument[at] != '/') {
             argument.insert(at, directory + "/");
         }
-    }
-    if (!prefixGiven) {
-        arguments.push_back("-artifact_prefix=" + directory + "/");
-    }
-    for (std::string& argument : arguments) {
         anchored.push_back(argument.data());
     }
     anchored.push_back(nullptr);
@@ -58,7 +52,7 @@ void AnchorPaths(int* argc, char*** argv, const std::string& directory) {
 }  // namespace
 
 extern "C" int LLVMFuzzerInitialize(int* argc, char*** argv) {
-    if (argc != nullptr && argv != nullptr) {
+    if (argc != nullptr && argv != nullptr && *argc > 0) {
         AnchorPaths(argc, argv, std::filesystem::current_path());
     }
     // The library opens and closes its log for every line: a tree in memory keeps that fast.
