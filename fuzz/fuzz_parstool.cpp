@@ -2,24 +2,17 @@
 // GetToken and the number and boolean conversions of every token.
 //
 // Input: the stream.
-#include <cstdint>
-#include <cstdio>
-#include <cstring>
-#include <vector>
 
 #include "fuzz/fuzzsupport.h"
 #include "util/parstool.h"
 
-namespace {
-
-bool Inside(const char* pointer, const std::vector<char>& buffer) {
+static bool Inside(const char* pointer, const std::vector<char>& buffer) {
     return pointer >= buffer.data() && pointer < buffer.data() + buffer.size();
 }
 
-void CheckToken(char* token) {
-    if (EvalBoolStr(token) && !IsBoolStr(token)) {
-        Violated("EvalBoolStr is true for a text that is no boolean word");
-    }
+static void CheckToken(char* token) {
+    Check(!EvalBoolStr(token) || IsBoolStr(token),
+          "EvalBoolStr is true for a text that is no boolean word");
     if (StrIsNum(token) == 1) {
         StrNum(token);
     }
@@ -29,57 +22,41 @@ void CheckToken(char* token) {
     }
     char* end = nullptr;
     StrToU32(token, &end, 0);
-    if (end == nullptr || end < token || end > token + std::strlen(token)) {
-        Violated("StrToU32 set its end outside the text");
-    }
+    Check(end != nullptr && end >= token && end <= token + std::strlen(token),
+          "StrToU32 set its end outside the text");
     StrToI32(token, &end, 10);
 }
 
-void CheckLine(const std::vector<char>& line) {
-    if (std::memchr(line.data(), '\0', line.size()) == nullptr) {
-        Violated("getline left the buffer unterminated");
-    }
+static void CheckLine(const std::vector<char>& line) {
+    Check(std::memchr(line.data(), '\0', line.size()) != nullptr,
+          "getline left the buffer unterminated");
     std::vector<char> copy(line);
-    char* trimmed = TrimStr(copy.data());
-    if (!Inside(trimmed, copy)) {
-        Violated("TrimStr returned a pointer outside the line");
-    }
-
+    Check(Inside(TrimStr(copy.data()), copy), "TrimStr returned a pointer outside the line");
     copy = line;
     char* cursor = TrimLine(copy.data());
-    if (!Inside(cursor, copy)) {
-        Violated("TrimLine returned a pointer outside the line");
-    }
+    Check(Inside(cursor, copy), "TrimLine returned a pointer outside the line");
     // Every token takes at least one byte of the line, so there cannot be more of them.
     size_t budget = std::strlen(cursor) + 1;
     while (char* token = GetToken(&cursor)) {
-        if (!Inside(token, copy) || !Inside(cursor, copy)) {
-            Violated("GetToken left the line");
-        }
-        if (budget-- == 0) {
-            Violated("GetToken does not advance");
-        }
+        Check(Inside(token, copy) && Inside(cursor, copy), "GetToken left the line");
+        Check(budget-- != 0, "GetToken does not advance");
         CheckToken(token);
     }
 }
 
-}  // namespace
-
 extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
-    StartInput();
-    InputStream input(data, size);
+    const InputScope input;
+    FILE* stream = InputStream(data, size);
     // The size the library reads its files with, and small ones that cut lines into pieces,
     // down to the smallest a caller may give.
     for (int lineChars : {1024, 7, 2}) {
-        FILE* stream = input.FromStart();
+        std::rewind(stream);
         // Exactly the size getline is told, so that a write past it is caught.
         std::vector<char> line(static_cast<size_t>(lineChars));
         size_t budget = size;
         while (getline(stream, line.data(), lineChars)) {
             // Each line read takes at least one byte of the stream.
-            if (budget-- == 0) {
-                Violated("getline does not advance");
-            }
+            Check(budget-- != 0, "getline does not advance");
             CheckLine(line);
         }
     }

@@ -1,107 +1,76 @@
 #include "fuzz/fuzzsupport.h"
 
-#include <ftw.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
-#include <cstdio>
+#include <cerrno>
 #include <cstdlib>
-#include <cstring>
-#include <vector>
+#include <filesystem>
 
-#include "dbglevel.h"
+#include "adapters/modquery.h"
 #include "diag/hwdebug.h"
 
 namespace {
 
 std::string ScratchRoot;
+size_t ReportedCount = 0;
+std::vector<uint8_t> Answer;
 
-void RemoveScratch() {
-    if (ScratchRoot.empty()) {
-        return;
+// query_module's contract: too small a buffer fails with ENOSPC and the size it needs.
+int FakeQueryModule(const char*, int which, void* buffer, size_t size, size_t* ret) {
+    errno = which != QM_SYMBOLS && which != QM_INFO ? EINVAL : size < Answer.size() ? ENOSPC : 0;
+    *ret = errno == ENOSPC || which == QM_INFO ? Answer.size() : ReportedCount;
+    if (errno == 0) {
+        std::copy(Answer.begin(), Answer.end(), static_cast<uint8_t*>(buffer));
     }
-    nftw(
-        ScratchRoot.c_str(),
-        [](const char* path, const struct stat*, int, struct FTW*) { return std::remove(path); },
-        16, FTW_DEPTH | FTW_PHYS);
-}
-
-[[noreturn]] void SetupFailed(const char* what, const std::string& path) {
-    std::fprintf(stderr, "fuzz harness: %s %s\n", what, path.c_str());
-    std::abort();
-}
-
-std::string Absolute(const std::string& path, const std::string& directory) {
-    return path.empty() || path[0] == '/' ? path : directory + "/" + path;
-}
-
-bool StartsWith(const std::string& text, const std::string& prefix) {
-    return text.compare(0, prefix.size(), prefix) == 0;
+    return errno == 0 ? 0 : -1;
 }
 
 // libFuzzer reads its arguments only after LLVMFuzzerInitialize: the paths in them (corpus
 // folders, inputs, artifact prefix, dictionary) are made absolute here, since the harness is
-// about to leave the directory they were given from. Without an artifact prefix, crashes are
-// written where the run was started, as usual.
+// about to leave the folder they were given from. Crashes go there unless a prefix is given.
 void AnchorPaths(int* argc, char*** argv, const std::string& directory) {
-    static std::vector<std::string> storage;
+    static std::vector<std::string> arguments(*argv, *argv + *argc);
     static std::vector<char*> anchored;
-    bool prefixGiven = false;
-    for (int i = 0; i < *argc; i++) {
-        std::string argument = (*argv)[i];
-        if (i > 0 && !argument.empty() && argument[0] != '-') {
-            argument = Absolute(argument, directory);
-        }
+    // libFuzzer takes the last of a repeated flag: a prefix given by the caller wins over this.
+    arguments.insert(arguments.begin() + 1, "-artifact_prefix=" + directory + "/");
+    for (std::string& argument : arguments) {
+        size_t at = argument.empty() || argument[0] != '-' ? 0 : std::string::npos;
         for (const char* flag : {"-artifact_prefix=", "-exact_artifact_path=", "-dict="}) {
-            if (i > 0 && StartsWith(argument, flag)) {
-                argument = flag + Absolute(argument.substr(std::strlen(flag)), directory);
-            }
+            at = argument.rfind(flag, 0) == 0 ? std::strlen(flag) : at;
         }
-        prefixGiven = prefixGiven || (i > 0 && StartsWith(argument, "-artifact_prefix="));
-        storage.push_back(argument);
-    }
-    if (!prefixGiven) {
-        storage.push_back("-artifact_prefix=" + directory + "/");
-    }
-    for (std::string& argument : storage) {
+        if (&argument != &arguments[0] && at < argument.size() && argument[at] != '/') {
+            argument.insert(at, directory + "/");
+        }
         anchored.push_back(argument.data());
     }
     anchored.push_back(nullptr);
-    *argc = static_cast<int>(storage.size());
+    *argc = static_cast<int>(arguments.size());
     *argv = anchored.data();
 }
 
 }  // namespace
 
 extern "C" int LLVMFuzzerInitialize(int* argc, char*** argv) {
-    char* started = getcwd(nullptr, 0);
-    if (started == nullptr) {
-        SetupFailed("cannot tell the working directory", "");
+    if (argc != nullptr && argv != nullptr && *argc > 0) {
+        AnchorPaths(argc, argv, std::filesystem::current_path());
     }
-    if (argc != nullptr && argv != nullptr) {
-        AnchorPaths(argc, argv, started);
-    }
-    std::free(started);
-
     // The library opens and closes its log for every line: a tree in memory keeps that fast.
     const char* tmp = std::getenv("TMPDIR");
-    std::string base = tmp != nullptr && *tmp != '\0'         ? tmp
-                       : access("/dev/shm", W_OK | X_OK) == 0 ? "/dev/shm"
-                                                              : "/tmp";
-    std::string pattern = base + "/velhfuzz.XXXXXX";
-    if (mkdtemp(pattern.data()) == nullptr) {
-        SetupFailed("cannot make a scratch directory from", pattern);
-    }
+    std::string pattern = tmp != nullptr && *tmp != '\0'         ? tmp
+                          : access("/dev/shm", W_OK | X_OK) == 0 ? "/dev/shm"
+                                                                 : "/tmp";
+    pattern += "/velhfuzz.XXXXXX";
+    Check(mkdtemp(pattern.data()) != nullptr, "cannot make a scratch directory " + pattern);
     ScratchRoot = pattern;
-    std::atexit(RemoveScratch);
-    for (const char* name : {"inst", "log"}) {
-        if (mkdir(ScratchPath(name).c_str(), 0700) != 0) {
-            SetupFailed("cannot make", ScratchPath(name));
-        }
-    }
-    if (chdir(ScratchPath("inst").c_str()) != 0) {
-        SetupFailed("cannot enter", ScratchPath("inst"));
-    }
+    std::atexit([] {
+        std::error_code ignored;
+        std::filesystem::remove_all(ScratchRoot, ignored);
+    });
+    Check(mkdir(ScratchPath("inst").c_str(), 0700) == 0 &&
+              mkdir(ScratchPath("log").c_str(), 0700) == 0 &&
+              chdir(ScratchPath("inst").c_str()) == 0,
+          "cannot make and enter " + ScratchPath("inst"));
     if (SetUpHarness != nullptr) {
         SetUpHarness();
     }
@@ -112,42 +81,47 @@ std::string ScratchPath(const std::string& name) {
     return ScratchRoot + "/" + name;
 }
 
-void StartInput() {
+InputScope::InputScope() {
     ResetDebugOut();
     HwInfoPrintLevel = 0;
 }
 
+InputScope::~InputScope() {
+    SystemList.DestroyAll();
+    BusList.DestroyAll();
+    SlotList.DestroyAll();
+    AdapterList.DestroyAll();
+}
+
 void WriteFile(const std::string& path, const uint8_t* data, size_t size) {
     FILE* file = std::fopen(path.c_str(), "wb");
-    if (file == nullptr) {
-        SetupFailed("cannot write", path);
-    }
-    const bool written = size == 0 || std::fwrite(data, 1, size, file) == size;
-    if (std::fclose(file) != 0 || !written) {
-        SetupFailed("cannot write", path);
-    }
+    const bool written = file != nullptr && (size == 0 || std::fwrite(data, 1, size, file) == size);
+    Check(file != nullptr && std::fclose(file) == 0 && written, "cannot write " + path);
 }
 
-InputStream::InputStream(const uint8_t* data, size_t size) : Bytes(data, data + size) {
-    Bytes.push_back('\0');
-    Stream = fmemopen(Bytes.data(), size, "r");
-}
-
-InputStream::~InputStream() {
-    if (Stream != nullptr) {
-        std::fclose(Stream);
+FILE* InputStream(const uint8_t* data, size_t size) {
+    // The bytes and one more, so that an empty input still has a buffer to stream from.
+    static std::vector<char> bytes;
+    static FILE* stream = nullptr;
+    if (stream != nullptr) {
+        std::fclose(stream);
     }
+    bytes.assign(data, data + size);
+    bytes.push_back('\0');
+    stream = fmemopen(bytes.data(), size, "r");
+    Check(stream != nullptr, "cannot make a stream of the input");
+    return stream;
 }
 
-FILE* InputStream::FromStart() {
-    if (Stream == nullptr) {
-        Violated("cannot make a stream of the input");
+void AnswerQueryModule(const uint8_t* data, size_t size) {
+    SysCalls().QueryModule = FakeQueryModule;
+    ReportedCount = data[0] | static_cast<size_t>(data[1]) << 8;
+    Answer.assign(data + 2, data + size);
+}
+
+void Check(bool holds, const std::string& violation) {
+    if (!holds) {
+        std::fprintf(stderr, "fuzz harness: violated: %s\n", violation.c_str());
+        std::abort();
     }
-    std::rewind(Stream);
-    return Stream;
-}
-
-void Violated(const char* what) {
-    std::fprintf(stderr, "fuzz harness: violated: %s\n", what);
-    std::abort();
 }

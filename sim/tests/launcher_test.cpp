@@ -1,15 +1,12 @@
 // The launcher: what the command sees, where it runs, what it returns, and what stays untouched.
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
-#include <sys/stat.h>
-#include <unistd.h>
 
 #include <chrono>
 #include <filesystem>
-#include <string>
 #include <thread>
 
-#include "sim/tests/simrun.h"
+#include "sim/launcher/argpaths.h"
 #include "sim/tests/testmachine.h"
 
 namespace velhsim::test {
@@ -17,23 +14,20 @@ namespace {
 
 namespace fs = std::filesystem;
 using ::testing::HasSubstr;
-using ::testing::StartsWith;
 
 // Every path below `root` with the contents of its files, to compare before and after a run.
 std::string Snapshot(const std::string& root) {
     std::string snapshot;
     for (const fs::directory_entry& entry : fs::recursive_directory_iterator(root)) {
-        snapshot += entry.path().string() + "\n";
-        if (entry.is_regular_file()) {
-            snapshot += FileText(entry.path().string()) + "\n";
-        }
+        snapshot += entry.path().string() + "\n" + FileText(entry.path()) + "\n";
     }
     return snapshot;
 }
 
-TEST(VelhsimMachine, ShowsTheMachinesFilesOverTheSystem) {
+TEST(VelhsimMachine, ShowsTheMachinesFilesOverTheSystemAndNeverChangesThem) {
     const ScratchDir dir;
     const std::string machine = WriteTestMachine(dir);
+    const std::string before = Snapshot(machine);
     const RunResult result = RunScript(machine, dir / "run",
                                        "cat /etc/SuSE-release /etc/sysconfig/kernel\n"
                                        "test -s /etc/passwd && echo passwd stays\n"
@@ -45,12 +39,15 @@ TEST(VelhsimMachine, ShowsTheMachinesFilesOverTheSystem) {
                                        "od -An -c -j $((0xF1234)) -N 5 /dev/mem\n"
                                        "od -An -c -j $((0xF1234 + 40)) -N 7 /dev/mem\n"
                                        "echo x > /dev/null && echo null works\n"
-                                       "pwd; test -d ../log && echo log beside\n");
+                                       "pwd; test -d ../log && echo log beside\n"
+                                       "$PROBE blink 1 1\n"
+                                       "echo changed > $VELHSIM_RUN/uname\n"
+                                       "rm $VELHSIM_RUN/driver/version\n"
+                                       "echo x >> /etc/SuSE-release 2>/dev/null\n"
+                                       "echo log > ../log/test.log\n");
     EXPECT_EQ(result.Status, 0) << result.Err;
-    const std::string run = dir / "run";
     EXPECT_EQ(result.Out,
-              "SuSE SLES-8 (i386)\nVERSION = 8.1\nINITRD_MODULES=\"alpha\"\n"
-              "passwd stays\n"
+              "SuSE SLES-8 (i386)\nVERSION = 8.1\nINITRD_MODULES=\"alpha\"\npasswd stays\n"
               "8086  Intel Corporation\n\t1229  82557\n"
               "/proc/bus/pci:\n00\n02\ndevices\n\n/proc/bus/pci/02:\n1f.3\n"
               "0008\t80861229\tb\tf4fff000\t00000000\t00000000\t00000000\t00000000\t00000000"
@@ -59,12 +56,17 @@ TEST(VelhsimMachine, ShowsTheMachinesFilesOverTheSystem) {
               "02fb\t80861229\t0\t00000000\t00000000\t00000000\t00000000\t00000000\t00000000"
               "\t00000000\t00000000\t00000000\t00000000\t00000000\t00000000\t00000000\t00000000"
               "\t\n"
-              "64\n20\n"
-              "1048576\n"
+              "64\n20\n1048576\n"
               " 252   U   V   P   D\n"
               "   K   7   4   0   C   4   D\n"
               "null works\n" +
-                  run + "/install\nlog beside\n");
+                  dir / "run/install\nlog beside\nblink ok\n");
+    EXPECT_EQ(Snapshot(machine), before);
+    // What the run built and wrote lies in the run folder only.
+    EXPECT_TRUE(fs::exists(dir / "run/dev/mem") && fs::exists(dir / "run/proc/bus/pci/devices"));
+    EXPECT_EQ(FileText(dir / "run/driver/blink.log"), "1 1\n");
+    EXPECT_EQ(FileText(dir / "run/log/test.log"), "log\n");
+    EXPECT_EQ(FileText(dir / "run/etc/SuSE-release"), FileText(machine + "/etc/SuSE-release"));
 }
 
 TEST(VelhsimMachine, RebuildsAFolderWhereAnEntryHasNoPlace) {
@@ -81,93 +83,60 @@ TEST(VelhsimMachine, RebuildsAFolderWhereAnEntryHasNoPlace) {
     EXPECT_EQ(result.Out, "extra\nnode\npci stays\n 00 00\nlinks stay\n") << result.Err;
 }
 
-TEST(VelhsimRunFolder, NeverChangesTheMachineFolder) {
-    const ScratchDir dir;
-    const std::string machine = WriteTestMachine(dir);
-    const std::string before = Snapshot(machine);
-    const RunResult result = RunScript(machine, dir / "run",
-                                       "$PROBE blink 1 1\n"
-                                       "echo changed > $VELHSIM_RUN/uname\n"
-                                       "rm $VELHSIM_RUN/driver/version\n"
-                                       "echo x >> /etc/SuSE-release 2>/dev/null\n"
-                                       "echo log > ../log/test.log\n");
-    EXPECT_EQ(result.Out, "blink ok\n");
-    EXPECT_EQ(Snapshot(machine), before);
-    // What the run built and wrote lies in the run folder only.
-    EXPECT_TRUE(fs::exists(dir / "run/dev/mem"));
-    EXPECT_TRUE(fs::exists(dir / "run/proc/bus/pci/devices"));
-    EXPECT_EQ(FileText(dir / "run/driver/blink.log"), "1 1\n");
-    EXPECT_EQ(FileText(dir / "run/log/test.log"), "log\n");
-    EXPECT_EQ(FileText(dir / "run/etc/SuSE-release"), FileText(machine + "/etc/SuSE-release"));
-}
-
-TEST(VelhsimRunFolder, RefusesARunFolderInUseOrInsideTheMachine) {
+TEST(VelhsimLauncher, ReturnsTheCommandsStatusAndRefusesWhatItCannotRun) {
     const ScratchDir dir;
     const std::string machine = WriteTestMachine(dir);
     dir.Write("used/something", "x");
     const std::string marker = dir / "ran";
-
-    RunResult result =
-        RunVelhsim({"--machine", machine, "--run-dir", dir / "used", "--", "touch", marker});
-    EXPECT_EQ(result.Status, 125);
-    EXPECT_THAT(result.Err, HasSubstr("is not a new or empty folder"));
-
-    result =
-        RunVelhsim({"--machine", machine, "--run-dir", machine + "/run", "--", "touch", marker});
-    EXPECT_EQ(result.Status, 125);
-    EXPECT_THAT(result.Err, HasSubstr("lies inside the machine folder"));
-
-    result = RunVelhsim({"--machine", dir / "nothing", "--", "touch", marker});
-    EXPECT_EQ(result.Status, 125);
-    EXPECT_THAT(result.Err, HasSubstr("no machine folder"));
-
-    result = RunVelhsim({"--machine", machine});
-    EXPECT_EQ(result.Status, 125);
-    EXPECT_THAT(result.Err, HasSubstr("usage:"));
-
+    const std::vector<std::string> touch = {"--", "touch", marker};
+    const auto in = [&](const std::string& run, std::vector<std::string> command) {
+        command.insert(command.begin(), {VELHSIM_LAUNCHER, "--machine", machine, "--run-dir", run});
+        return command;
+    };
+    const struct {
+        std::vector<std::string> Command;
+        int Status;
+        std::string Err;
+    } cases[] = {
+        {in(dir / "a", {"--", "sh", "-c", "exit 7"}), 7, ""},
+        {in(dir / "b", {"--", "sh", "-c", "kill -9 $$"}), 128 + 9, ""},
+        {in(dir / "c", {"--", "velhsim-no-such-cmd"}), 127, "cannot run velhsim-no-such-cmd"},
+        {in(dir / "used", touch), 125, "is not a new or empty folder"},
+        {in(machine + "/run", touch), 125, "lies inside the machine folder"},
+        {{VELHSIM_LAUNCHER, "--machine", dir / "nothing", "--", "touch", marker},
+         125,
+         "no machine folder"},
+        {{VELHSIM_LAUNCHER, "--machine", machine}, 125, "usage:"},
+        // A user namespace of the test's own in which no mount namespace may be made.
+        {{"unshare", "--user", "--map-root-user", "sh", "-c",
+          "echo 0 > /proc/sys/user/max_mnt_namespaces && exec \"$@\"", "sh", VELHSIM_LAUNCHER,
+          "--machine", machine, "--run-dir", dir / "d", "--", "touch", marker},
+         125,
+         "velhsim: cannot create a private mount namespace: No space left on device (a "
+         "namespace limit"},
+    };
+    for (const auto& c : cases) {
+        const RunResult result = RunProgram(c.Command);
+        EXPECT_EQ(result.Status, c.Status) << c.Command.back();
+        EXPECT_THAT(result.Err, HasSubstr(c.Err));
+    }
     EXPECT_FALSE(fs::exists(marker));
     EXPECT_FALSE(fs::exists(machine + "/run"));
+    EXPECT_FALSE(fs::exists(dir / "d"));
 }
 
-TEST(VelhsimRunFolder, MakesATemporaryOneAndNamesIt) {
+TEST(VelhsimLauncher, MakesATemporaryRunFolderAndNamesIt) {
     const ScratchDir dir;
     const std::string machine = WriteTestMachine(dir);
     const RunResult result =
         RunVelhsim({"--machine", machine, "--", "sh", "-c", "echo $VELHSIM_RUN; pwd"});
     ASSERT_EQ(result.Status, 0) << result.Err;
     const std::string run = result.Out.substr(0, result.Out.find('\n'));
-    EXPECT_THAT(run, StartsWith("/tmp/velhsim."));
+    EXPECT_EQ(run.rfind("/tmp/velhsim.", 0), 0u) << run;
     EXPECT_EQ(result.Out, run + "\n" + run + "/install\n");
     EXPECT_THAT(result.Err, HasSubstr("velhsim: run folder " + run + "\n"));
     EXPECT_TRUE(fs::exists(run + "/driver/asl.bin"));
     fs::remove_all(run);
-}
-
-TEST(VelhsimLauncher, ReturnsTheCommandsStatus) {
-    const ScratchDir dir;
-    const std::string machine = WriteTestMachine(dir);
-    EXPECT_EQ(RunScript(machine, dir / "a", "exit 7").Status, 7);
-    EXPECT_EQ(RunScript(machine, dir / "b", "kill -9 $$").Status, 128 + 9);
-    const RunResult missing =
-        RunVelhsim({"--machine", machine, "--run-dir", dir / "c", "--", "velhsim-no-such-cmd"});
-    EXPECT_EQ(missing.Status, 127);
-    EXPECT_THAT(missing.Err, HasSubstr("cannot run velhsim-no-such-cmd"));
-}
-
-TEST(VelhsimLauncher, SaysWhyWhenItGetsNoNamespaceAndRunsNothing) {
-    // A user namespace of the test's own in which no mount namespace may be made.
-    const ScratchDir dir;
-    const std::string machine = WriteTestMachine(dir);
-    const std::string marker = dir / "ran";
-    const RunResult result = RunProgram(
-        {"unshare", "--user", "--map-root-user", "sh", "-c",
-         "echo 0 > /proc/sys/user/max_mnt_namespaces && exec \"$@\"", "sh", LauncherPath(),
-         "--machine", machine, "--run-dir", dir / "run", "--", "touch", marker});
-    EXPECT_EQ(result.Status, 125);
-    EXPECT_THAT(result.Err, HasSubstr("velhsim: cannot create a private mount namespace: No "
-                                      "space left on device (a namespace limit"));
-    EXPECT_FALSE(fs::exists(marker));
-    EXPECT_FALSE(fs::exists(dir / "run"));
 }
 
 TEST(VelhsimLauncher, EndsWhatTheCommandLeftRunning) {
@@ -185,16 +154,37 @@ TEST(VelhsimLauncher, EndsWhatTheCommandLeftRunning) {
 TEST(VelhsimLauncher, ResolvesRelativeArgumentsFromWhereItStarted) {
     const ScratchDir dir;
     const std::string machine = WriteTestMachine(dir);
-    dir.Write("origin/data/x.txt", "from origin\n");
+    const std::string origin = dir / "origin";
+    for (const char* name : {"data/x.txt", "build/agent.jar", "lib/a.jar", "tools/run", "build2"}) {
+        dir.Write("origin/" + std::string(name), "from origin\n");
+    }
     // A name that also exists in the install folder means the install folder's file.
     dir.Write("origin/dbgprint", "from origin\n");
     const RunResult result = RunVelhsim({"--machine", machine, "--run-dir", dir / "run", "--",
                                          "env", "LIST=data:nothing-here:data/x.txt", "sh", "-c",
                                          "cat \"$1\" dbgprint; echo $LIST", "sh", "data/x.txt"},
-                                        dir / "origin");
-    EXPECT_EQ(result.Out, "from origin\nhwdbgprint 0x0\n" + dir / "origin/data" +
-                              ":nothing-here:" + dir / "origin/data/x.txt" + "\n")
+                                        origin);
+    EXPECT_EQ(result.Out, "from origin\nhwdbgprint 0x0\n" + origin +
+                              "/data:nothing-here:" + origin + "/data/x.txt\n")
         << result.Err;
+
+    // Options with a path, class path lists; a command given with a folder is resolved too, one
+    // without is left to PATH.
+    const std::vector<std::string> expected = {
+        origin + "/tools/run",
+        "-Djava.library.path=" + origin + "/build",
+        "-cp",
+        origin + "/build/agent.jar:" + origin + "/lib/a.jar:missing.jar",
+        "/abs/build",
+        "com.example.Main",
+        origin + "/build",
+        "-Dx="};
+    EXPECT_EQ(ResolveArguments({"tools/run", "-Djava.library.path=build", "-cp",
+                                "build/agent.jar:lib/a.jar:missing.jar", "/abs/build",
+                                "com.example.Main", "build", "-Dx="},
+                               origin, machine + "/install"),
+              expected);
+    EXPECT_EQ(ResolveArguments({"build2"}, origin, machine + "/install")[0], "build2");
 }
 
 TEST(VelhsimLauncher, RunsUnprivilegedInAUserNamespace) {
@@ -204,15 +194,14 @@ TEST(VelhsimLauncher, RunsUnprivilegedInAUserNamespace) {
     // Copies of the launcher, its preload library, the probe and a machine that the unprivileged
     // user can reach.
     const ScratchDir dir;
-    fs::permissions(dir.Path(), fs::perms::all, fs::perm_options::add);
     const std::string machine = WriteTestMachine(dir);
     const std::string bin = dir / "bin";
     fs::create_directories(bin);
-    const std::string launcherDir = fs::path(LauncherPath()).parent_path().string();
-    for (const char* name : {"velhsim", "libvelhsim-preload.so"}) {
-        fs::copy(launcherDir + "/" + name, bin + "/" + name);
-    }
-    fs::copy(ProbePath(), bin + "/probe");
+    const fs::path launcher = VELHSIM_LAUNCHER;
+    fs::copy(launcher, bin + "/velhsim");
+    fs::copy(launcher.parent_path() / "libvelhsim-preload.so", bin + "/libvelhsim-preload.so");
+    fs::copy(VELHSIM_PROBE, bin + "/probe");
+    fs::permissions(dir.Path(), fs::perms::all, fs::perm_options::add);
     for (const fs::directory_entry& entry : fs::recursive_directory_iterator(dir.Path())) {
         fs::permissions(entry.path(), fs::perms::others_read | fs::perms::others_exec,
                         fs::perm_options::add);

@@ -1,29 +1,22 @@
 #include "sim/tests/simrun.h"
 
-#include <fcntl.h>
-#include <sys/wait.h>
-#include <unistd.h>
-
 #include <cstdio>
 #include <cstdlib>
 #include <filesystem>
 #include <stdexcept>
-#include <system_error>
 
-#include "filehandle.h"
 #include "sim/common/textfile.h"
 #include "sim/launcher/process.h"
+#include "sim/tests/testmachine.h"
 
 namespace velhsim::test {
 
 namespace fs = std::filesystem;
 
-ScratchDir::ScratchDir() {
-    std::string pattern = "/tmp/velhsim-test.XXXXXX";
-    if (mkdtemp(pattern.data()) == nullptr) {
+ScratchDir::ScratchDir() : Root("/tmp/velhsim-test.XXXXXX") {
+    if (mkdtemp(Root.data()) == nullptr) {
         throw std::runtime_error("mkdtemp failed");
     }
-    Root = pattern;
 }
 
 ScratchDir::~ScratchDir() {
@@ -31,15 +24,10 @@ ScratchDir::~ScratchDir() {
     fs::remove_all(Root, ignored);
 }
 
-std::string ScratchDir::operator/(const std::string& name) const {
-    return JoinPath(Root, name);
-}
-
 void ScratchDir::Write(const std::string& name, const std::string& content) const {
-    const std::string path = *this / name;
-    fs::create_directories(fs::path(path).parent_path());
-    if (!WriteWholeFile(path, content)) {
-        throw std::runtime_error("cannot write " + path);
+    fs::create_directories(fs::path(*this / name).parent_path());
+    if (!WriteWholeFile(*this / name, content)) {
+        throw std::runtime_error("cannot write " + name);
     }
 }
 
@@ -59,45 +47,31 @@ std::string Hex(const std::string& bytes) {
 
 RunResult RunProgram(const std::vector<std::string>& command, const std::string& dir) {
     const ScratchDir output;
-    const std::string outPath = output / "out";
-    const std::string errPath = output / "err";
-    const pid_t child = fork();
-    if (child == 0) {
-        const UniqueFd out(open(outPath.c_str(), O_WRONLY | O_CREAT | O_TRUNC, 0644));
-        const UniqueFd err(open(errPath.c_str(), O_WRONLY | O_CREAT | O_TRUNC, 0644));
-        const UniqueFd none(open("/dev/null", O_RDONLY));
-        if (!out || !err || !none || dup2(out.Get(), 1) < 0 || dup2(err.Get(), 2) < 0 ||
-            dup2(none.Get(), 0) < 0 || (!dir.empty() && chdir(dir.c_str()) != 0)) {
-            _exit(120);
-        }
-        ExecCommand(command);
-    }
-    RunResult result;
-    int status = 0;
-    if (child > 0 && waitpid(child, &status, 0) == child) {
-        result.Status = WIFEXITED(status) ? WEXITSTATUS(status) : 128 + WTERMSIG(status);
-    }
-    result.Out = FileText(outPath);
-    result.Err = FileText(errPath);
-    return result;
-}
-
-std::string ProbePath() {
-    return VELHSIM_PROBE;
-}
-std::string LauncherPath() {
-    return VELHSIM_LAUNCHER;
+    std::vector<std::string> redirected{
+        "sh", "-c", "exec \"$@\" </dev/null >" + output / "out" + " 2>" + output / "err", "sh"};
+    redirected.insert(redirected.end(), command.begin(), command.end());
+    const int status = velhsim::RunProgram(redirected, dir.empty() ? "." : dir);
+    return {status, FileText(output / "out"), FileText(output / "err")};
 }
 
 RunResult RunVelhsim(const std::vector<std::string>& arguments, const std::string& dir) {
-    std::vector<std::string> command{LauncherPath()};
+    std::vector<std::string> command{VELHSIM_LAUNCHER};
     command.insert(command.end(), arguments.begin(), arguments.end());
     return RunProgram(command, dir);
 }
 
 RunResult RunScript(const std::string& machine, const std::string& run, const std::string& script) {
     return RunVelhsim({"--machine", machine, "--run-dir", run, "--", "sh", "-c",
-                       "PROBE=" + ProbePath() + "\n" + script});
+                       std::string("PROBE=") + VELHSIM_PROBE + "\n" + script});
+}
+
+std::string TestTable() {
+    return FileText(VELHSIM_TEST_MACHINE "/driver/asl.bin");
+}
+
+std::string WriteTestMachine(const ScratchDir& dir, const std::string& name) {
+    fs::copy(VELHSIM_TEST_MACHINE, dir / name, fs::copy_options::recursive);
+    return dir / name;
 }
 
 }  // namespace velhsim::test

@@ -1,4 +1,4 @@
-// What the simulator's tests share: scratch folders, machine files, and running velhsim.
+// What the simulator's tests share: scratch folders, the test machine, and running velhsim.
 #pragma once
 
 #include <string>
@@ -13,9 +13,8 @@ class ScratchDir {
     ~ScratchDir();
     ScratchDir(const ScratchDir&) = delete;
     ScratchDir& operator=(const ScratchDir&) = delete;
-
     const std::string& Path() const { return Root; }
-    std::string operator/(const std::string& name) const;
+    std::string operator/(const std::string& name) const { return Root + "/" + name; }
     // Writes a file below the folder, making the folders on its way.
     void Write(const std::string& name, const std::string& content) const;
 
@@ -31,20 +30,13 @@ struct RunResult {
 
 // Runs a program to its end in `dir` (the current folder when empty), with its output collected.
 RunResult RunProgram(const std::vector<std::string>& command, const std::string& dir = "");
-
 // Runs velhsim with these arguments.
 RunResult RunVelhsim(const std::vector<std::string>& arguments, const std::string& dir = "");
-
 // Runs `script` with sh under velhsim against `machine`, in the run folder `run`; the probe
 // program's path is in $PROBE.
 RunResult RunScript(const std::string& machine, const std::string& run, const std::string& script);
-
-std::string ProbePath();
-std::string LauncherPath();
-
 // The text of a file, empty when it cannot be read.
 std::string FileText(const std::string& path);
-
 // Bytes as lowercase hexadecimal digits, as the probe prints a table.
 std::string Hex(const std::string& bytes);
 

@@ -1,7 +1,5 @@
-// A small machine with every part that velhsim knows, written by the tests.
+// A small machine with every part that velhsim knows: the folder `machine` beside this file.
 #pragma once
-
-#include <string>
 
 #include "sim/tests/simrun.h"
 
@@ -9,8 +7,7 @@ namespace velhsim::test {
 
 // The slot driver's table in the test machine: 40 bytes, "VHSL" and then 0 to 35.
 std::string TestTable();
-
-// Writes the machine into `dir`/`name` and returns its path.
+// Copies the machine into `dir`/`name` and returns its path.
 std::string WriteTestMachine(const ScratchDir& dir, const std::string& name = "machine");
 
 }  // namespace velhsim::test
