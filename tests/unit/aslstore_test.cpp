@@ -308,24 +308,3 @@ TEST_F(AslStoreTest, XRefGivesChassisAndDrawersTheirOwnBusses) {
     EXPECT_EQ(Tree.Log(),
               "\nVELHLIB, XRefAsl():  System 2 names string 9, which the packet does not hold\n");
 }
-
-TEST_F(AslStoreTest, XRefTraceLines) {
-    HwInfoPrintLevel = TRACE_XREF_ASL;
-    AslBuilder packet;
-    packet.Header().String(0, "D").Drawer(2, 0).Bus({5, 0, 2, 8}).Slot({6, 5, 1, 1, 1}).End();
-    Store(packet);
-    EXPECT_EQ(Tree.Log(),
-              "\nXRefAsl():  XREFING BUS AND SLOT DESCRIPTORS\n\n"
-              "XRefAsl():  looking for BusID 5\n"
-              "XRefAsl():  found BusID 5\n"
-              "XRefAsl():  setting bus hotplug support flag\n"
-              "XRefAsl():  setting first slot number to 6\n"
-              "XRefAsl():  bumped bus slot count to 1\n"
-              "\n"
-              "\nXRefAsl():  XREFING SYSTEM AND BUS DESCRIPTORS\n\n"
-              "XRefAsl():  retrieving StringID 0\n"
-              "XRefAsl():  storing string, setting system's slot defaults\n"
-              "XRefAsl():  looking for busses on drawer 2\n"
-              "XRefAsl():  BusID 5 on DrawerNum 2\n"
-              "\n");
-}

@@ -35,11 +35,7 @@ struct FakeDriver {
         }
     }
     size_t Count(unsigned long request) const {
-        size_t count = 0;
-        for (unsigned long sent : Requests) {
-            count += sent == request;
-        }
-        return count;
+        return static_cast<size_t>(std::count(Requests.begin(), Requests.end(), request));
     }
 
   private:

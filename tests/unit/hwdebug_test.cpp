@@ -41,14 +41,6 @@ class HwDebugTest : public ::testing::Test {
     InstallTree tree;
 };
 
-std::string Narrow(const wchar_t* text) {
-    std::string narrow;
-    for (; *text != L'\0'; text++) {
-        narrow += static_cast<char>(*text);
-    }
-    return narrow;
-}
-
 }  // namespace
 
 TEST_F(HwDebugTest, LevelFileLines) {
@@ -192,12 +184,12 @@ TEST_F(HwDebugTest, WideningLimits) {
 
     text += "bc";
     MakeWideString(text.c_str(), target);
-    EXPECT_EQ(Narrow(target), std::string(1023, 'a'));
+    EXPECT_EQ(std::wstring(target), std::wstring(1023, L'a'));
     EXPECT_EQ(tree.Log(), "MakeWideString():  Warning, buffer overflow\n");
 
     ResetDebugOut();
     MakeWideStringI("ab", target, 9);
-    EXPECT_EQ(Narrow(target), "    |   |ab");
+    EXPECT_STREQ(target, L"    |   |ab");
     MakeWideStringI(std::string(1015, 'x').c_str(), target, 8);
     EXPECT_EQ(std::wcslen(target), 1023u);
     EXPECT_EQ(tree.Log(), "");

@@ -56,15 +56,6 @@ TEST(ObjListTemp, DeleteDuringEnumerationContinuesWithTheFollowingObject) {
     EXPECT_EQ(list.Next(), nullptr);
 }
 
-TEST(ObjListTemp, DestroyAllEmptiesTheList) {
-    ObjListTemp<AdapterDescriptor> list;
-    list.Add(new AdapterDescriptor);
-    list.Add(new AdapterDescriptor);
-    list.DestroyAll();
-    list.BeginEnumeration();
-    EXPECT_EQ(list.Next(), nullptr);
-}
-
 // The copy owns its own module name: freeing one never frees the other's.
 TEST(AdapterDescriptor, CopyAssignmentDuplicatesTheModuleName) {
     AdapterDescriptor source;

@@ -43,13 +43,15 @@ class SlotDriverTest : public ::testing::Test {
         HwInfoPrintLevel = 0;
     }
 
-    // The error block of a failed request or open, ending with the error number and its text.
-    static std::string ErrorBlock(const std::string& function, const std::string& message,
-                                  int error) {
+    // The error number and its text, as a failed request or open reports them.
+    static std::string Errno(int error) {
         char number[16];
         std::snprintf(number, sizeof(number), "0x%08x", error);
-        return "\nVELHLIB, " + function + ":  " + message + " (" + number +
-               "):  " + std::strerror(error) + "\n\n";
+        return std::string(" (") + number + "):  " + std::strerror(error);
+    }
+    static std::string ErrorBlock(const std::string& function, const std::string& message,
+                                  int error) {
+        return "\nVELHLIB, " + function + ":  " + message + Errno(error) + "\n\n";
     }
 
     bool PacketUntouchedFrom(size_t offset) const {
@@ -188,9 +190,6 @@ TEST_F(SlotDriverTest, BlinkRequest) {
     Fake.FailRequest = VELH_IOCTL_BLINK;
     Fake.FailErrno = EBUSY;
     EXPECT_FALSE(HwSetBlinkState(3, 1));
-    char number[16];
-    std::snprintf(number, sizeof(number), "0x%08x", EBUSY);
     EXPECT_EQ(Tree.Log(),
-              std::string("velhlib, HwSetBlinkState():  VelhSlot driver call failed (") + number +
-                  "):  " + std::strerror(EBUSY) + "\n");
+              "velhlib, HwSetBlinkState():  VelhSlot driver call failed" + Errno(EBUSY) + "\n");
 }
