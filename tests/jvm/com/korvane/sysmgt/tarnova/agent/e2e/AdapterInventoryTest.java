@@ -68,21 +68,19 @@ class AdapterInventoryTest {
         List<Map<String, Map<String, String>>> tables = new ArrayList<>();
         String[] header = null;
         for (String text : Files.readAllLines(file)) {
-            String[] cells = text.startsWith("|") ? text.substring(1).split("\\|", -1) : null;
-            if (cells == null) {
-                header = null;
-            } else if (header == null) {
-                header = cells;
+            String[] cells = text.replaceFirst("^\\|", "").split(" *\\| *", -1);
+            if (!text.startsWith("|") || header == null) {
+                header = text.startsWith("|") ? cells : null;
                 tables.add(new LinkedHashMap<>());
             } else if (!text.startsWith("|---")) {
                 Map<String, String> row = new HashMap<>();
                 for (int i = 0; i < header.length; i++) {
                     row.put(header[i].trim(), cells[i].trim());
                 }
-                String id = row.getOrDefault("AdapterID", row.get(header[0].trim()));
-                tables.get(tables.size() - 1).put(id, row);
+                tables.get(tables.size() - 1).put(row.getOrDefault("AdapterID", cells[0].trim()), row);
             }
         }
+        tables.removeIf(Map::isEmpty);
         return tables;
     }
 }

@@ -14,12 +14,10 @@ import java.util.regex.Pattern;
 import java.util.stream.Collectors;
 
 /**
- * Runs a main class in a fresh JVM that loads the JNI library, as the agent runs: in ROOT/run
- * (install/ and log/), with stand-ins for "slotwatch" and "killall" first on the path (each
- * appends its command line to ROOT/calls/NAME) and, with {@link #onMachine}, under the simulator
- * on ROOT/machine, a copy of the machine folder that {@link #edit} changes first. With the
- * property velh.i386.java the JVM is that 32-bit one under qemu-i386, and the simulator comes from
- * the 64-bit build velh.sim.build.dir.
+ * Runs a main class in a fresh JVM that loads the JNI library: in ROOT/run (install/, log/), with
+ * recording stand-ins (ROOT/calls/NAME) for "slotwatch" and "killall" first on the path and, with
+ * {@link #onMachine}, under the simulator on a copy of the machine folder. With velh.i386.java the
+ * JVM is that 32-bit one under qemu-i386, the simulator that of the build velh.sim.build.dir.
  */
 final class AgentHarness {
     interface Edit {
@@ -148,10 +146,9 @@ final class AgentHarness {
             env.put("PATH", bin + File.pathSeparator + env.getOrDefault("PATH", "/usr/bin:/bin"));
             env.putAll(environment);
             Process process = builder.start();
-            long timeout = i386 ? 300 : 60;
-            if (!process.waitFor(timeout, TimeUnit.SECONDS)) {
+            if (!process.waitFor(i386 ? 300 : 60, TimeUnit.SECONDS)) {
                 process.destroyForcibly().waitFor();
-                throw new IllegalStateException("no end within " + timeout + " s: " + command);
+                throw new IllegalStateException("no end in time: " + command);
             }
             return new Result(root, run, process.exitValue(), read(root.resolve("stdout")),
                 read(root.resolve("stderr")));
