@@ -1,17 +1,11 @@
 package com.korvane.sysmgt.tarnova.agent.e2e;
 
-import static org.junit.jupiter.api.Assertions.assertEquals;
+import static org.junit.jupiter.api.Assertions.*;
 
-import com.google.gson.JsonElement;
+import com.google.gson.*;
 import java.io.IOException;
-import java.nio.file.Files;
-import java.nio.file.Path;
-import java.util.ArrayList;
-import java.util.Collections;
-import java.util.HashMap;
-import java.util.LinkedHashMap;
-import java.util.List;
-import java.util.Map;
+import java.nio.file.*;
+import java.util.*;
 import org.junit.jupiter.api.Test;
 import org.junit.jupiter.api.io.TempDir;
 
@@ -30,8 +24,8 @@ class AdapterInventoryTest {
     Path temp;
 
     @Test
-    void theFourInventoriesDescribeTheExpectedAdaptersElementByElement() throws IOException {
-        Path machine = AgentHarness.sampleMachine("chassis-drawer");
+    void theFourInventoriesDescribeTheExpectedAdaptersElementByElement() throws Exception {
+        Path machine = AgentHarness.sample("chassis-drawer");
         // Discovery and filter, names, final inventory: each keyed by the adapter's identifier.
         List<Map<String, Map<String, String>>> tables = tables(machine.resolve("EXPECTED.md"));
         List<String> expected = new ArrayList<>();
@@ -44,29 +38,26 @@ class AdapterInventoryTest {
                 row.put("Function", function[2]);
                 row.put("Name", tables.get(1).get(id).get("Name"));
                 row.put("IsBootDev", tables.get(2).get(id).get("boot"));
-                expected.add(line(row));
+                expected.add(line(row::get));
             }
         });
         Collections.reverse(expected);
 
         AgentHarness.Result result = new AgentHarness(temp).onMachine(machine)
-            .editMachine(copy -> Files.delete(copy.resolve("install/velhadp.crd")))
+            .edit(copy -> Files.delete(copy.resolve("install/velhadp.crd")))
             .agent("--json");
-        assertEquals(0, result.exitCode, result::toString);
+        assertEquals(0, result.exitCode(), result::toString);
         List<String> actual = new ArrayList<>();
         for (JsonElement adapter : result.document().getAsJsonArray("adapters")) {
-            Map<String, String> values = new HashMap<>();
-            adapter.getAsJsonObject().entrySet()
-                .forEach(field -> values.put(field.getKey(), field.getValue().getAsString()));
-            actual.add(line(values));
+            actual.add(line(field -> adapter.getAsJsonObject().get(field).getAsString()));
         }
         assertEquals(expected, actual);
     }
 
-    private static String line(Map<String, String> adapter) {
+    private static String line(java.util.function.UnaryOperator<String> adapter) {
         StringBuilder text = new StringBuilder();
         for (String field : FIELDS) {
-            String value = adapter.get(field);
+            String value = adapter.apply(field);
             text.append(field).append('=').append(WORDS.getOrDefault(value, value)).append(' ');
         }
         return text.toString();
@@ -77,21 +68,19 @@ class AdapterInventoryTest {
         List<Map<String, Map<String, String>>> tables = new ArrayList<>();
         String[] header = null;
         for (String text : Files.readAllLines(file)) {
-            String[] cells = text.startsWith("|") ? text.substring(1).split("\\|", -1) : null;
-            if (cells == null) {
-                header = null;
-            } else if (header == null) {
-                header = cells;
+            String[] cells = text.replaceFirst("^\\|", "").split(" *\\| *", -1);
+            if (!text.startsWith("|") || header == null) {
+                header = text.startsWith("|") ? cells : null;
                 tables.add(new LinkedHashMap<>());
             } else if (!text.startsWith("|---")) {
                 Map<String, String> row = new HashMap<>();
                 for (int i = 0; i < header.length; i++) {
                     row.put(header[i].trim(), cells[i].trim());
                 }
-                String id = row.getOrDefault("AdapterID", row.get(header[0].trim()));
-                tables.get(tables.size() - 1).put(id, row);
+                tables.get(tables.size() - 1).put(row.getOrDefault("AdapterID", cells[0].trim()), row);
             }
         }
+        tables.removeIf(Map::isEmpty);
         return tables;
     }
 }

@@ -1,162 +1,96 @@
 package com.korvane.sysmgt.tarnova.agent.e2e;
 
-import static org.junit.jupiter.api.Assertions.assertEquals;
+import static org.junit.jupiter.api.Assertions.*;
 
-import com.google.gson.JsonArray;
-import com.google.gson.JsonElement;
-import com.google.gson.JsonObject;
-import com.google.gson.JsonParseException;
-import com.google.gson.JsonParser;
+import com.google.gson.*;
 import java.io.File;
 import java.io.IOException;
 import java.io.UncheckedIOException;
 import java.nio.charset.StandardCharsets;
-import java.nio.file.Files;
-import java.nio.file.Path;
-import java.nio.file.StandardCopyOption;
-import java.util.ArrayList;
-import java.util.Arrays;
-import java.util.LinkedHashMap;
-import java.util.List;
-import java.util.Map;
+import java.nio.file.*;
+import java.util.*;
 import java.util.concurrent.TimeUnit;
-import java.util.stream.Stream;
+import java.util.regex.Pattern;
+import java.util.stream.Collectors;
 
 /**
- * Runs a main class in a fresh JVM that loads the JNI library, the way the agent runs: in an
- * install directory with the log directory beside it, with recording stand-ins for the programs
- * the library starts by name ("slotwatch", "killall") first on the search path. Each run gets a
- * new root: ROOT/bin (the stand-ins, each appending its command line to ROOT/calls/NAME),
- * ROOT/run (install/ and log/) and, with {@link #onMachine}, ROOT/machine, the copy of the machine
- * folder that {@link #editMachine} changes and the simulator (sim/velhsim) runs the JVM on.
- *
- * <p>Needs the system properties velh.build.dir, velh.agent.jar, velh.test.jar and, for machines,
- * velh.machines.dir and velh.data.dir. With velh.i386.java (a 32-bit JVM's java) the agent runs in
- * that JVM under qemu-i386 (velhsim --i386 with a machine), loading the 32-bit library of
- * velh.build.dir, and the simulator comes from the 64-bit build velh.sim.build.dir.
+ * Runs a main class in a fresh JVM that loads the JNI library: in ROOT/run (install/, log/), with
+ * recording stand-ins (ROOT/calls/NAME) for "slotwatch" and "killall" first on the path and, with
+ * {@link #onMachine}, under the simulator on a copy of the machine folder. With velh.i386.java the
+ * JVM is that 32-bit one under qemu-i386, the simulator that of the build velh.sim.build.dir.
  */
-public final class AgentHarness {
-    private static final long TIMEOUT_SECONDS = 60;
-
-    private final Path base;
-    private final Path buildDir = Path.of(property("velh.build.dir"));
-    private String i386Java = System.getProperty("velh.i386.java", "");
-    private Path libraryDir = buildDir;
-    private boolean jniLog;
-    private Path machine;
-    private final Map<String, String> environment = new LinkedHashMap<>();
-    private final List<String> jvmOptions = new ArrayList<>(List.of("-Xcheck:jni"));
-    private final List<MachineEdit> machineEdits = new ArrayList<>();
-
-    /** A change to the run's copy of the machine folder, made before the simulator starts. */
-    @FunctionalInterface
-    public interface MachineEdit {
+final class AgentHarness {
+    interface Edit {
         void apply(Path machine) throws IOException;
     }
 
-    /** @param base the folder under which every run gets its root (a test's temporary folder) */
-    public AgentHarness(Path base) {
-        this.base = base;
+    private final Path base;
+    private String i386Java = System.getProperty("velh.i386.java", "");
+    private Path libraryDir = Path.of(property("velh.build.dir"));
+    private boolean jniLog;
+    private Path machine;
+    private final Map<String, String> environment = new HashMap<>();
+    private final List<Edit> edits = new ArrayList<>();
+
+    AgentHarness(Path base) { this.base = base; }
+
+    static String property(String name) { return Path.of(System.getProperty(name)).toString(); }
+
+    static Path sample(String name) { return Path.of(property("velh.machines.dir"), name); }
+
+    static int occurrences(String text, String part) {
+        return text.split(Pattern.quote(part), -1).length - 1;
     }
 
-    static String property(String name) {
-        String value = System.getProperty(name);
-        if (value == null || value.isEmpty()) {
-            throw new IllegalStateException("system property " + name + " is not set");
+    static JsonObject json(String text) { return JsonParser.parseString(text).getAsJsonObject(); }
+
+    static void copyTree(Path from, Path to) throws IOException, InterruptedException {
+        assertEquals(0, new ProcessBuilder("cp", "-rT", "--preserve=mode", from.toString(),
+            to.toString()).inheritIO().start().waitFor());
+    }
+
+    /** Equal to the file, or with VELH_GOLDEN_UPDATE=1 written to it instead, for review. */
+    static void assertGolden(Path expected, String actual) throws IOException {
+        if ("1".equals(System.getenv("VELH_GOLDEN_UPDATE"))) {
+            Files.writeString(expected, actual);
         }
-        return value;
+        assertEquals(Objects.requireNonNullElse(read(expected), "(missing)"), actual,
+            expected::toString);
     }
 
-    /** A machine folder of sim/machines. */
-    public static Path sampleMachine(String name) {
-        return Path.of(property("velh.machines.dir")).resolve(name);
-    }
-
-    /** How often part occurs in text. */
-    public static int occurrences(String text, String part) {
-        int count = 0;
-        for (int at = text.indexOf(part); at >= 0; at = text.indexOf(part, at + 1)) {
-            count++;
-        }
-        return count;
-    }
-
-    /** A JSON document; a text that is none fails the test with the text shown. */
-    public static JsonObject json(String text) {
-        try {
-            return JsonParser.parseString(text).getAsJsonObject();
-        } catch (JsonParseException | IllegalStateException e) {
-            throw new AssertionError("not a JSON document: " + text, e);
-        }
-    }
-
-    /**
-     * Checks the systems, busses and slots of a document against the expected ones in
-     * tests/jvm/data/NAME, element by element and field by field, leaving out the named fields
-     * (those worked out later for a table from a file, such as the bus speeds).
-     */
-    public static void assertTopology(String name, JsonObject document, String... ignored)
+    /** The systems, busses and slots of data/NAME, field by field, but for the ignored ones. */
+    static void assertTopology(String name, JsonObject document, String... ignored)
         throws IOException {
         JsonObject expected = json(Files.readString(Path.of(property("velh.data.dir"), name)));
         for (String kind : List.of("systems", "busses", "slots")) {
             JsonArray want = expected.getAsJsonArray(kind);
-            JsonArray got = document.getAsJsonArray(kind);
-            assertEquals(want.size(), got.size(), () -> kind + ": " + got);
-            for (int i = 0; i < want.size(); i++) {
-                for (Map.Entry<String, JsonElement> field : want.get(i).getAsJsonObject()
-                         .entrySet()) {
-                    if (List.of(ignored).contains(field.getKey())) {
-                        continue;
-                    }
-                    assertEquals(field.getValue(), got.get(i).getAsJsonObject().get(field.getKey()),
-                        kind + " element " + i + " " + field.getKey());
-                }
+            JsonArray got = document.getAsJsonArray(kind).deepCopy();
+            for (JsonArray array : List.of(want, got)) {
+                array.forEach(element -> List.of(ignored).forEach(element.getAsJsonObject()::remove));
             }
+            assertEquals(want, got, kind);
         }
     }
 
     /** Creates an empty "../log/jni.log", which switches the JNI-side log on. */
-    public AgentHarness withJniLog() {
-        jniLog = true;
-        return this;
-    }
+    AgentHarness withJniLog() { jniLog = true; return this; }
 
-    /** Runs the 64-bit JVM and library of velh.sim.build.dir, to compare a 32-bit run with. */
-    public AgentHarness on64Bit() {
+    /** The 64-bit JVM and library of velh.sim.build.dir. */
+    AgentHarness on64Bit() {
         i386Java = "";
         libraryDir = Path.of(property("velh.sim.build.dir"));
         return this;
     }
 
-    /** Runs the JVM under the simulator against a machine folder. */
-    public AgentHarness onMachine(Path machineFolder) {
-        machine = machineFolder;
-        return this;
-    }
+    AgentHarness onMachine(Path folder) { machine = folder; return this; }
 
-    /** Changes the run's copy of the machine folder; edits apply in the order given. */
-    public AgentHarness editMachine(MachineEdit edit) {
-        machineEdits.add(edit);
-        return this;
-    }
+    AgentHarness edit(Edit edit) { edits.add(edit); return this; }
 
-    /** Writes a file into the run's copy of the machine folder (replacing any). */
-    public AgentHarness withMachineFile(String relativePath, String content) {
-        return editMachine(machine -> Files.writeString(machine.resolve(relativePath), content));
-    }
+    AgentHarness env(String name, String value) { environment.put(name, value); return this; }
 
-    public AgentHarness withEnvironment(String name, String value) {
-        environment.put(name, value);
-        return this;
-    }
+    Result scenario(String... steps) { return run(Scenario.class.getName(), steps); }
 
-    /** Runs the step interpreter {@link Scenario} with the given steps. */
-    public Result scenario(String... steps) {
-        return run(Scenario.class.getName(), steps);
-    }
-
-    /** Runs the agent's own command line. */
-    public Result agent(String... args) {
+    Result agent(String... args) {
         return run("com.korvane.sysmgt.tarnova.agent.TarnovaAgent", args);
     }
 
@@ -171,168 +105,101 @@ public final class AgentHarness {
                 bin.resolve(program).toFile().setExecutable(true);
             }
             Path run = root.resolve("run");
+            Path logDir = run.resolve("log");
             List<String> command = new ArrayList<>();
+            boolean i386 = !i386Java.isEmpty();
             if (machine != null) {
                 Path copy = root.resolve("machine");
                 copyTree(machine, copy);
-                for (MachineEdit edit : machineEdits) {
+                for (Edit edit : edits) {
                     edit.apply(copy);
                 }
-                setJniLog(copy.resolve("log"));
-                String sim = System.getProperty("velh.sim.build.dir", buildDir.toString());
-                command.addAll(List.of(Path.of(sim, "sim/velhsim").toString(), "--machine",
-                    copy.toString(), "--run-dir", run.toString()));
-                command.addAll(i386Java.isEmpty() ? List.of("--") : List.of("--i386", "--"));
+                logDir = copy.resolve("log");
+                String sim = System.getProperty("velh.sim.build.dir", libraryDir.toString());
+                command.addAll(List.of(sim + "/sim/velhsim", "--machine", copy.toString(),
+                    "--run-dir", run.toString(), i386 ? "--i386" : "--"));
+                command.addAll(i386 ? List.of("--") : List.of());
             } else {
                 Files.createDirectories(run.resolve("install"));
-                setJniLog(Files.createDirectories(run.resolve("log")));
-                command.addAll(i386Java.isEmpty() ? List.of() : List.of("qemu-i386", "-L", "/"));
+                Files.createDirectories(logDir);
+                command.addAll(i386 ? List.of("qemu-i386", "-L", "/") : List.of());
             }
-            command.add(i386Java.isEmpty()
-                ? Path.of(System.getProperty("java.home"), "bin", "java").toString() : i386Java);
-            command.addAll(jvmOptions);
-            if (!i386Java.isEmpty()) {
-                // The interpreter only: under qemu the JIT's code patching across threads now and
-                // then trips the JVM's own checks (an internal error in RelocIterator).
-                command.add("-Xint");
+            Files.deleteIfExists(logDir.resolve("jni.log"));
+            if (jniLog) {
+                Files.createFile(logDir.resolve("jni.log"));
             }
+            command.add(i386 ? i386Java : System.getProperty("java.home") + "/bin/java");
+            // Under qemu only the interpreter: the JIT's code patching across threads now and
+            // then trips the JVM's own checks.
+            command.addAll(i386 ? List.of("-Xcheck:jni", "-Xint") : List.of("-Xcheck:jni"));
             command.addAll(List.of("-Djava.library.path=" + libraryDir, "-cp",
                 property("velh.agent.jar") + File.pathSeparator + property("velh.test.jar"),
                 mainClass));
-            command.addAll(Arrays.asList(args));
-
+            command.addAll(List.of(args));
             ProcessBuilder builder = new ProcessBuilder(command)
                 .redirectOutput(root.resolve("stdout").toFile())
                 .redirectError(root.resolve("stderr").toFile())
-                .redirectInput(ProcessBuilder.Redirect.from(new File("/dev/null")));
-            // Under the simulator the install directory exists only once the launcher made it.
-            builder.directory(machine != null ? root.toFile() : run.resolve("install").toFile());
+                .redirectInput(new File("/dev/null"))
+                // Under the simulator the install directory exists only once the launcher made it.
+                .directory(machine != null ? root.toFile() : run.resolve("install").toFile());
             Map<String, String> env = builder.environment();
             env.put("PATH", bin + File.pathSeparator + env.getOrDefault("PATH", "/usr/bin:/bin"));
             env.putAll(environment);
             Process process = builder.start();
-            // qemu runs the 32-bit JVM several times slower.
-            long timeout = i386Java.isEmpty() ? TIMEOUT_SECONDS : 5 * TIMEOUT_SECONDS;
-            if (!process.waitFor(timeout, TimeUnit.SECONDS)) {
+            if (!process.waitFor(i386 ? 300 : 60, TimeUnit.SECONDS)) {
                 process.destroyForcibly().waitFor();
-                throw new IllegalStateException("the JVM did not end within " + timeout + " s: "
-                    + command);
+                throw new IllegalStateException("no end in time: " + command);
             }
-            return new Result(root, run, process.exitValue());
+            return new Result(root, run, process.exitValue(), read(root.resolve("stdout")),
+                read(root.resolve("stderr")));
+        } catch (IOException | InterruptedException e) {
+            throw new IllegalStateException(e);
+        }
+    }
+
+    /** A file's text, decoded leniently (a log is checked, not trusted), or null without one. */
+    static String read(Path file) {
+        try {
+            return Files.exists(file)
+                ? new String(Files.readAllBytes(file), StandardCharsets.UTF_8) : null;
         } catch (IOException e) {
             throw new UncheckedIOException(e);
-        } catch (InterruptedException e) {
-            Thread.currentThread().interrupt();
-            throw new IllegalStateException("interrupted", e);
         }
     }
 
-    private void setJniLog(Path logDir) throws IOException {
-        Path log = logDir.resolve("jni.log");
-        Files.deleteIfExists(log);
-        if (jniLog) {
-            Files.createFile(log);
-        }
+    private static List<String> lines(Path file) {
+        String text = read(file);
+        return text == null ? List.of() : text.lines().collect(Collectors.toList());
     }
 
-    static void copyTree(Path from, Path to) throws IOException {
-        try (Stream<Path> paths = Files.walk(from)) {
-            for (Path path : (Iterable<Path>) paths::iterator) {
-                Path target = to.resolve(from.relativize(path).toString());
-                if (Files.isDirectory(path)) {
-                    Files.createDirectories(target);
-                } else {
-                    Files.copy(path, target, StandardCopyOption.COPY_ATTRIBUTES);
-                }
-            }
-        }
-    }
+    /** What a run left behind; runDir holds install/, log/ and the machine's files. */
+    record Result(Path root, Path runDir, int exitCode, String stdout, String stderr) {
+        String jniLog() { return read(runDir.resolve("log/jni.log")); }
 
-    /** What one JVM run left behind. */
-    public static final class Result {
-        public final Path root;
-        /** The run folder: install/ and log/, and under the simulator the machine's files. */
-        public final Path runDir;
-        public final int exitCode;
-        public final String stdout;
-        public final String stderr;
+        String hwLog() { return read(runDir.resolve("log/velhslot.slotmgr.hwinfo.log")); }
 
-        Result(Path root, Path run, int exitCode) {
-            this.root = root;
-            this.runDir = run;
-            this.exitCode = exitCode;
-            this.stdout = read(root.resolve("stdout"));
-            this.stderr = read(root.resolve("stderr"));
-        }
+        JsonObject document() { return json(stdout); }
 
-        /** The JNI-side log, or null when there is no such file. */
-        public String jniLog() {
-            return read(runDir.resolve("log/jni.log"));
-        }
+        List<String> driverRequests() { return lines(runDir.resolve("driver/requests.log")); }
 
-        /** The hardware-information log, or null when there is no such file. */
-        public String hwLog() {
-            return read(runDir.resolve("log/velhslot.slotmgr.hwinfo.log"));
-        }
-
-        /** The JSON document that the agent's --json printed. */
-        public JsonObject document() {
-            return json(stdout);
-        }
-
-        /** The requests that the emulated slot driver received, one line each. */
-        public List<String> driverRequests() {
-            return lines(runDir.resolve("driver/requests.log"));
-        }
-
-        /**
-         * The runs of a stand-in, one line each: its name and arguments. The programs run
-         * detached and may end after the JVM, so this waits until at least {@code atLeast} runs
-         * are recorded (or 10 s) and a little longer for any further run.
-         */
-        public List<String> calls(String program, int atLeast) {
+        /** The runs of a stand-in, which may end after the JVM: waits for atLeast, then 0.3 s. */
+        List<String> calls(String program, int atLeast) throws InterruptedException {
             Path record = root.resolve("calls").resolve(program);
-            long deadline = System.currentTimeMillis() + 10_000;
-            try {
-                while (lines(record).size() < atLeast && System.currentTimeMillis() < deadline) {
-                    Thread.sleep(20);
-                }
-                Thread.sleep(300);
-            } catch (InterruptedException e) {
-                Thread.currentThread().interrupt();
+            for (int i = 0; i < 500 && lines(record).size() < atLeast; i++) {
+                Thread.sleep(20);
             }
+            Thread.sleep(300);
             return lines(record);
         }
 
-        /** The lines that the step interpreter printed for one kind of step ("version=..."). */
-        public List<String> values(String key) {
-            List<String> values = new ArrayList<>();
-            for (String line : stdout.split("\n")) {
-                if (line.startsWith(key + "=")) {
-                    values.add(line.substring(key.length() + 1));
-                }
-            }
-            return values;
+        List<String> values(String key) {
+            return stdout.lines().filter(line -> line.startsWith(key + "="))
+                .map(line -> line.substring(key.length() + 1)).collect(Collectors.toList());
         }
 
         @Override
         public String toString() {
             return "exit " + exitCode + "\n--- stdout\n" + stdout + "--- stderr\n" + stderr;
-        }
-
-        private static List<String> lines(Path file) {
-            String text = read(file);
-            return text == null || text.isEmpty() ? List.of() : List.of(text.split("\n"));
-        }
-
-        private static String read(Path file) {
-            try {
-                // Decoded leniently: a log is checked, not trusted to be valid text.
-                return Files.exists(file)
-                    ? new String(Files.readAllBytes(file), StandardCharsets.UTF_8) : null;
-            } catch (IOException e) {
-                throw new UncheckedIOException(e);
-            }
         }
     }
 }

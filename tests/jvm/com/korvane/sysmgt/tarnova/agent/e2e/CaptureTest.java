@@ -1,13 +1,10 @@
 package com.korvane.sysmgt.tarnova.agent.e2e;
 
-import static org.junit.jupiter.api.Assertions.assertEquals;
-import static org.junit.jupiter.api.Assertions.assertTrue;
+import static org.junit.jupiter.api.Assertions.*;
 
-import com.google.gson.JsonObject;
-import java.nio.file.Files;
-import java.nio.file.Path;
-import java.util.ArrayList;
-import java.util.List;
+import com.google.gson.*;
+import java.nio.file.*;
+import java.util.*;
 import java.util.stream.Stream;
 import org.junit.jupiter.api.Test;
 import org.junit.jupiter.api.io.TempDir;
@@ -32,7 +29,7 @@ class CaptureTest {
 
     private JsonObject json(Path machine) {
         AgentHarness.Result result = new AgentHarness(temp).onMachine(machine).agent("--json");
-        assertEquals(0, result.exitCode, result::toString);
+        assertEquals(0, result.exitCode(), result::toString);
         return result.document();
     }
 
@@ -46,7 +43,7 @@ class CaptureTest {
 
     @Test
     void aSimulatedMachineComesBackWithItsFunctionsDriverAndInventories() throws Exception {
-        Path sample = AgentHarness.sampleMachine("chassis-drawer");
+        Path sample = AgentHarness.sample("chassis-drawer");
         Path copy = Files.createDirectory(temp.resolve("copy"));
         Path run = temp.resolve("run");
         capture(copy, buildDir + "/sim/velhsim", "--machine", sample.toString(), "--run-dir",
