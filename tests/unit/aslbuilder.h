@@ -12,30 +12,16 @@
 
 #include "asl.h"
 
+// Fields in descriptor order; unnamed drawers and slot numbers are 255.
 struct AslBusSpec {
-    uint8_t BusID = 0;
-    uint8_t ChassisID = 0;
-    uint8_t DrawerID = 255;
-    uint8_t BusNumber = 0;
-    uint8_t Speed = 0;
-    uint8_t At33 = 0;
-    uint8_t At66 = 0;
-    uint8_t AtX66 = 0;
-    uint8_t AtX100 = 0;
-    uint8_t AtX133 = 0;
+    uint8_t BusID = 0, ChassisID = 0, DrawerID = 255, BusNumber = 0, Speed = 0;
+    uint8_t At33 = 0, At66 = 0, AtX66 = 0, AtX100 = 0, AtX133 = 0;
 };
 
 struct AslSlotSpec {
     uint16_t SlotID = 0;
-    uint8_t BusID = 0;
-    uint8_t DeviceNum = 0;
-    uint8_t Sun = 255;
-    uint8_t Attrib1 = 0;
-    uint8_t Attrib2 = 0;
-    uint8_t AttnReason = 0;
-    uint8_t Status = 0;
-    uint8_t LedStatus = 0;
-    uint8_t SlotUiNumber = 0;
+    uint8_t BusID = 0, DeviceNum = 0, Sun = 255, Attrib1 = 0, Attrib2 = 0, AttnReason = 0;
+    uint8_t Status = 0, LedStatus = 0, SlotUiNumber = 0;
 };
 
 class AslBuilder {

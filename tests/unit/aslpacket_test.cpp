@@ -2,7 +2,6 @@
 
 #include <gtest/gtest.h>
 
-#include <cstring>
 #include <string>
 #include <vector>
 
@@ -19,10 +18,8 @@ struct Seen {
 };
 
 // Records what the walk hands out, in order.
-class Recorder : public AslVisitor {
-  public:
+struct Recorder : AslVisitor {
     explicit Recorder(const void* base) : Base(static_cast<const RAW_ASL_DATA*>(base)) {}
-
     void Visit(const AslDescriptor& d) override {
         Seen seen{d.Type, static_cast<uint32_t>(d.At - Base), d.Size, {}};
         if (d.Fields != nullptr) {
@@ -34,86 +31,58 @@ class Recorder : public AslVisitor {
     void Stepped(const RAW_ASL_DATA* next) override {
         Steps.push_back(static_cast<uint32_t>(next - Base));
     }
-
     const RAW_ASL_DATA* Base;
     std::vector<Seen> Visits;
     std::vector<uint32_t> Steps;
-};
-
-struct Walked {
-    AslWalkEnd End;
-    std::vector<Seen> Visits;
-    std::vector<uint32_t> Steps;
+    AslWalkEnd End = AslWalkEnd::EndMarker;
 };
 
 // Walks a copy of the packet's first `size` bytes in a heap buffer of exactly that size, so
 // that a read past the delivered bytes is caught by the sanitizers.
-Walked Walk(const std::vector<uint8_t>& bytes, size_t size) {
-    const std::vector<uint8_t> buffer(bytes.begin(), bytes.begin() + static_cast<long>(size));
+Recorder Walk(const AslBuilder& builder, size_t size = 0) {
+    size = size == 0 ? builder.Size() : size;
+    const std::vector<uint8_t> buffer(builder.Bytes.begin(), builder.Bytes.begin() + long(size));
     Recorder recorder(buffer.data());
-    const AslWalkEnd end = WalkAslPacket(reinterpret_cast<const _ASL_PACKET*>(buffer.data()),
-                                         static_cast<uint32_t>(size), recorder);
-    return Walked{end, recorder.Visits, recorder.Steps};
-}
-
-Walked Walk(const AslBuilder& builder) {
-    return Walk(builder.Bytes, builder.Size());
+    recorder.End = WalkAslPacket(reinterpret_cast<const _ASL_PACKET*>(buffer.data()),
+                                 static_cast<uint32_t>(size), recorder);
+    return recorder;
 }
 
 }  // namespace
 
-TEST(DescriptorSize, SizesByTypeWithBitSevenForced) {
+TEST(DescriptorSize, SizesByTypeWithBitSevenForcedAndNeverReadsPastTheAvailableBytes) {
     InstallTree tree;
-    const uint8_t bus[] = {0x81, 20, 0};
-    const uint8_t invalidSlot[] = {0x02, 16};
-    const uint8_t header[] = {'V', 'H', 'S', 'L', 16};
-    const uint8_t string[] = {0x91, 4, 'a', 'b', 'c', 0, 0x55};
-    const uint8_t invalidString[] = {0x11, 4, 0};
-    const uint8_t end[] = {0xA0};
-    const uint8_t blank[] = {0x20};
-    EXPECT_EQ(DescriptorSize(bus, sizeof(bus)), 20u);
-    EXPECT_EQ(DescriptorSize(invalidSlot, sizeof(invalidSlot)), 16u);
-    EXPECT_EQ(DescriptorSize(header, sizeof(header)), 16u);
-    EXPECT_EQ(DescriptorSize(string, sizeof(string)), 6u);
-    EXPECT_EQ(DescriptorSize(invalidString, sizeof(invalidString)), 3u);
-    EXPECT_EQ(DescriptorSize(end, sizeof(end)), 1u);
-    // 0x20 with bit 7 forced reads as the end marker: size 1 and no message.
-    EXPECT_EQ(DescriptorSize(blank, sizeof(blank)), 1u);
+    // Bytes, available, size. 0x20 with bit 7 forced reads as the end marker.
+    const std::tuple<std::vector<uint8_t>, uint32_t, uint32_t> cases[] = {
+        {{0x81, 20, 0}, 3, 20},
+        {{0x02, 16}, 2, 16},
+        {{'V', 'H', 'S', 'L', 16}, 5, 16},
+        {{0x91, 4, 'a', 'b', 'c', 0, 0x55}, 7, 6},
+        {{0x91, 4, 'a', 'b', 'c', 0}, 6, 6},
+        {{0x11, 4, 0}, 3, 3},
+        {{0xA0}, 1, 1},
+        {{0x20}, 1, 1},
+        {{0x91, 4, 'a', 'b', 'c', 0}, 5, ASL_SIZE_PAST_END},
+        {{0x91, 4, 'a', 'b', 'c', 0}, 2, ASL_SIZE_PAST_END},
+        {{0x81, 16}, 1, ASL_SIZE_PAST_END},
+        {{0x81, 16}, 0, ASL_SIZE_PAST_END},
+        {{'V', 'H', 'S', 'L', 16}, 4, ASL_SIZE_PAST_END},
+    };
+    for (const auto& [bytes, available, size] : cases) {
+        EXPECT_EQ(DescriptorSize(bytes.data(), available), size) << int(bytes[0]) << available;
+    }
     EXPECT_EQ(tree.Log(), "");
-
     const uint8_t unknown[] = {0x55, 16};
     EXPECT_EQ(DescriptorSize(unknown, sizeof(unknown)), 0u);
     EXPECT_EQ(tree.Log(), "\nVELHLIB, DescriptorSize():  Invalid descriptor type: 0x55\n");
 }
 
-TEST(DescriptorSize, NeverReadsPastTheAvailableBytes) {
-    InstallTree tree;
-    const uint8_t string[] = {0x91, 4, 'a', 'b', 'c', 0};
-    // The terminator is the last available byte, then one byte short of it.
-    EXPECT_EQ(DescriptorSize(string, 6), 6u);
-    EXPECT_EQ(DescriptorSize(string, 5), ASL_SIZE_PAST_END);
-    EXPECT_EQ(DescriptorSize(string, 2), ASL_SIZE_PAST_END);
-    const uint8_t bus[] = {0x81, 16};
-    EXPECT_EQ(DescriptorSize(bus, 1), ASL_SIZE_PAST_END);
-    EXPECT_EQ(DescriptorSize(bus, 0), ASL_SIZE_PAST_END);
-    const uint8_t header[] = {'V', 'H', 'S', 'L', 16};
-    EXPECT_EQ(DescriptorSize(header, 4), ASL_SIZE_PAST_END);
-    EXPECT_EQ(tree.Log(), "");
-}
-
 TEST(WalkAslPacket, HandsOutEveryDescriptorInOrderAndStepsOverInvalidOnes) {
     InstallTree tree;
     AslBuilder packet;
-    packet.Header()
-        .Bus({1, 0, 255, 4, 7})
-        .Slot({3, 1})
-        .Invalid()
-        .String(2, "abc")
-        .Chassis(0, 2)
-        .Length(20)
-        .Raw({1, 2, 3, 4})  // the chassis' four extra bytes
-        .End();
-    const Walked walked = Walk(packet);
+    packet.Header().Bus({1, 0, 255, 4, 7}).Slot({3, 1}).Invalid().String(2, "abc");
+    packet.Chassis(0, 2).Length(20).Raw({1, 2, 3, 4}).End();  // the chassis' four extra bytes
+    Recorder walked = Walk(packet);
     EXPECT_EQ(walked.End, AslWalkEnd::EndMarker);
     ASSERT_EQ(walked.Visits.size(), 4u);
     EXPECT_EQ(walked.Visits[0].Type, 0x81);
@@ -127,109 +96,102 @@ TEST(WalkAslPacket, HandsOutEveryDescriptorInOrderAndStepsOverInvalidOnes) {
     EXPECT_EQ(walked.Visits[3].Type, 0x86);
     EXPECT_EQ(walked.Visits[3].Size, 20u);
     EXPECT_EQ(walked.Steps, (std::vector<uint32_t>{32, 48, 54, 74}));
-    EXPECT_EQ(tree.Log(), "");
 
     // A header followed directly by the end marker is a valid, empty packet.
-    AslBuilder empty;
-    empty.Header().End();
-    const Walked none = Walk(empty);
-    EXPECT_EQ(none.End, AslWalkEnd::EndMarker);
-    EXPECT_TRUE(none.Visits.empty());
-}
+    walked = Walk(AslBuilder().Header().End());
+    EXPECT_EQ(walked.End, AslWalkEnd::EndMarker);
+    EXPECT_TRUE(walked.Visits.empty());
 
-TEST(WalkAslPacket, UnknownTypeEndsTheWalkAfterSteppingOverIt) {
-    InstallTree tree;
-    AslBuilder blank;
-    blank.Header().Chassis(0, 0).Raw({0x20}).Bus({1}).End();
-    Walked walked = Walk(blank);
-    EXPECT_EQ(walked.End, AslWalkEnd::UnknownType);
-    ASSERT_EQ(walked.Visits.size(), 2u);
-    EXPECT_EQ(walked.Visits[1].Type, 0x20);
-    EXPECT_EQ(walked.Steps, (std::vector<uint32_t>{32, 33}));
-    EXPECT_EQ(tree.Log(), "");
-
-    AslBuilder odd;
-    odd.Header().Raw({0x55, 0, 0}).End();
-    walked = Walk(odd);
-    EXPECT_EQ(walked.End, AslWalkEnd::UnknownType);
-    ASSERT_EQ(walked.Visits.size(), 1u);
-    EXPECT_EQ(walked.Visits[0].Fields.size(), 0u);
-    EXPECT_EQ(walked.Steps, (std::vector<uint32_t>{16}));  // stepped by a size of 0
-    EXPECT_EQ(tree.Log(), "\nVELHLIB, DescriptorSize():  Invalid descriptor type: 0x55\n");
-}
-
-TEST(WalkAslPacket, ShortFixedDescriptorReadsZeroPastItsEnd) {
-    InstallTree tree;
-    AslBuilder packet;
-    packet.Header().Raw({0x86, 5, 7, 0, 9}).Raw({0x87, 3, 4}).End();
-    // Deliver exactly the bytes up to the end marker.
-    const Walked walked = Walk(packet);
+    // A short fixed descriptor reads zero past its end, not the bytes that follow it.
+    walked = Walk(AslBuilder().Header().Raw({0x86, 5, 7, 0, 9}).Raw({0x87, 3, 4}).End());
     EXPECT_EQ(walked.End, AslWalkEnd::EndMarker);
     ASSERT_EQ(walked.Visits.size(), 2u);
     EXPECT_EQ(walked.Visits[0].Fields,
               (std::vector<uint8_t>{0x86, 5, 7, 0, 9, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0}));
     EXPECT_EQ(walked.Visits[1].Fields[2], 4);
-    EXPECT_EQ(walked.Visits[1].Fields[4], 0);  // not the end marker that follows it
+    EXPECT_EQ(walked.Visits[1].Fields[4], 0);
+    EXPECT_EQ(tree.Log(), "");
 }
 
-TEST(WalkAslPacket, HostilePacketsEndTheWalkWithAnErrorLine) {
-    InstallTree tree;
-    {
+TEST(WalkAslPacket, UnknownTypesAndHostilePacketsEndTheWalk) {
+    AslBuilder noString;
+    noString.Header().String(1, "Main");
+    noString.Bytes.pop_back();  // text running to the end of the delivered bytes
+    struct Case {
+        AslBuilder Packet;
+        size_t Size;
+        AslWalkEnd End;
+        size_t Visits;
+        std::vector<uint32_t> Steps;
+        std::string Log;
+    } cases[] = {
+        {AslBuilder().Header().Chassis(0, 0).Raw({0x20}).Bus({1}).End(),
+         0,
+         AslWalkEnd::UnknownType,
+         2,
+         {32, 33},
+         ""},
+        {AslBuilder().Header().Raw({0x55, 0, 0}).End(),
+         0,
+         AslWalkEnd::UnknownType,
+         1,
+         {16},
+         "\nVELHLIB, DescriptorSize():  Invalid descriptor type: 0x55\n"},
         // A zero Length would step on the same place for ever.
-        AslBuilder packet;
-        packet.Header().Chassis(0, 0).Bus({1}).Length(0).End();
-        const Walked walked = Walk(packet);
-        EXPECT_EQ(walked.End, AslWalkEnd::Malformed);
-        EXPECT_EQ(walked.Visits.size(), 1u);
-        EXPECT_NE(tree.Log().find("\nVELHLIB, WalkAslPacket():  Descriptor type 0x81 at offset 32 "
-                                  "has length 0\n"),
-                  std::string::npos);
+        {AslBuilder().Header().Chassis(0, 0).Bus({1}).Length(0).End(),
+         0,
+         AslWalkEnd::Malformed,
+         1,
+         {32},
+         "\nVELHLIB, WalkAslPacket():  Descriptor type 0x81 at offset 32 has length 0\n"},
+        {AslBuilder().Header().Chassis(0, 0).Slot({1}).End(),
+         40,
+         AslWalkEnd::Malformed,
+         1,
+         {32},
+         "\nVELHLIB, WalkAslPacket():  Descriptor type 0x82 at offset 32 runs past the 40 bytes "
+         "of the packet\n"},
+        {AslBuilder().Header().Bus({1}).Length(200).End(),
+         0,
+         AslWalkEnd::Malformed,
+         0,
+         {},
+         "\nVELHLIB, WalkAslPacket():  Descriptor type 0x81 at offset 16 runs past the 33 bytes "
+         "of the packet\n"},
+        {AslBuilder().Header().Bus({1}).Slot({2}),
+         0,
+         AslWalkEnd::Malformed,
+         2,
+         {32, 48},
+         "\nVELHLIB, WalkAslPacket():  No end marker within the 48 bytes of the packet\n"},
+        {noString,
+         0,
+         AslWalkEnd::Malformed,
+         0,
+         {},
+         "\nVELHLIB, WalkAslPacket():  Descriptor type 0x91 at offset 16 runs past the 22 bytes "
+         "of the packet\n"},
+        {AslBuilder().Header(),
+         10,
+         AslWalkEnd::Malformed,
+         0,
+         {},
+         "\nVELHLIB, WalkAslPacket():  No end marker within the 10 bytes of the packet\n"},
+    };
+    for (const Case& c : cases) {
+        InstallTree tree;
+        const Recorder walked = Walk(c.Packet, c.Size);
+        EXPECT_EQ(walked.End, c.End) << c.Log;
+        ASSERT_EQ(walked.Visits.size(), c.Visits) << c.Log;
+        EXPECT_EQ(walked.Steps, c.Steps) << c.Log;
+        if (walked.Steps == std::vector<uint32_t>{16}) {
+            EXPECT_TRUE(walked.Visits[0].Fields.empty());  // a type of unknown size has none
+        }
+        EXPECT_EQ(tree.Log(), c.Log);
     }
-    {
-        // Delivered bytes end in the middle of a slot descriptor.
-        AslBuilder packet;
-        packet.Header().Chassis(0, 0).Slot({1}).End();
-        const Walked walked = Walk(packet.Bytes, 40);
-        EXPECT_EQ(walked.End, AslWalkEnd::Malformed);
-        EXPECT_EQ(walked.Visits.size(), 1u);
-        EXPECT_NE(tree.Log().find("Descriptor type 0x82 at offset 32 runs past the 40 bytes of "
-                                  "the packet\n"),
-                  std::string::npos);
-    }
-    {
-        // A Length byte that reaches past the delivered bytes.
-        AslBuilder packet;
-        packet.Header().Bus({1}).Length(200).End();
-        EXPECT_EQ(Walk(packet).End, AslWalkEnd::Malformed);
-    }
-    {
-        // No end marker: the walk stops at the last delivered byte.
-        AslBuilder packet;
-        packet.Header().Bus({1}).Slot({2});
-        const Walked walked = Walk(packet);
-        EXPECT_EQ(walked.End, AslWalkEnd::Malformed);
-        EXPECT_EQ(walked.Visits.size(), 2u);
-        EXPECT_NE(tree.Log().find("No end marker within the 48 bytes of the packet\n"),
-                  std::string::npos);
-    }
-    {
-        // A string whose text runs to the end of the delivered bytes without a terminator.
-        AslBuilder packet;
-        packet.Header().String(1, "Main");
-        packet.Bytes.pop_back();
-        const Walked walked = Walk(packet);
-        EXPECT_EQ(walked.End, AslWalkEnd::Malformed);
-        EXPECT_TRUE(walked.Visits.empty());
-        EXPECT_NE(tree.Log().find("Descriptor type 0x91 at offset 16 runs past the 22 bytes"),
-                  std::string::npos);
-    }
-    {
-        // Fewer bytes than the header.
-        EXPECT_EQ(Walk(AslBuilder().Header().Bytes, 10).End, AslWalkEnd::Malformed);
-        Recorder recorder(nullptr);
-        EXPECT_EQ(WalkAslPacket(nullptr, 100, recorder), AslWalkEnd::Malformed);
-        EXPECT_TRUE(recorder.Visits.empty());
-    }
+    Recorder recorder(nullptr);
+    EXPECT_EQ(WalkAslPacket(nullptr, 100, recorder), AslWalkEnd::Malformed);
+    EXPECT_TRUE(recorder.Visits.empty());
 }
 
 TEST(WalkAslPacket, NeverWalksPastThePacketBuffer) {
@@ -243,10 +205,9 @@ TEST(WalkAslPacket, NeverWalksPastThePacketBuffer) {
     }
     packet.Bus({2}).Length(40);
     ASSERT_EQ(packet.Size(), ASL_PACKET_CAPACITY);
-    Recorder recorder(packet.Bytes.data());
-    EXPECT_EQ(
-        WalkAslPacket(reinterpret_cast<const _ASL_PACKET*>(packet.Bytes.data()), 200000, recorder),
-        AslWalkEnd::Malformed);
+    const auto* bytes = reinterpret_cast<const _ASL_PACKET*>(packet.Bytes.data());
+    Recorder recorder(bytes);
+    EXPECT_EQ(WalkAslPacket(bytes, 200000, recorder), AslWalkEnd::Malformed);
     EXPECT_EQ(recorder.Visits.size(), (ASL_PACKET_CAPACITY - 32) / 16);
     EXPECT_NE(tree.Log().find("Descriptor type 0x81 at offset 80000 runs past the 80016 bytes "
                               "of the packet\n"),
@@ -255,9 +216,9 @@ TEST(WalkAslPacket, NeverWalksPastThePacketBuffer) {
     // Without the last one the buffer is full of descriptors and has no end marker.
     packet.Bytes.resize(ASL_PACKET_CAPACITY - 16);
     packet.Bus({2});
-    Recorder full(packet.Bytes.data());
-    EXPECT_EQ(WalkAslPacket(reinterpret_cast<const _ASL_PACKET*>(packet.Bytes.data()), 80017, full),
-              AslWalkEnd::Malformed);
+    bytes = reinterpret_cast<const _ASL_PACKET*>(packet.Bytes.data());
+    Recorder full(bytes);
+    EXPECT_EQ(WalkAslPacket(bytes, 80017, full), AslWalkEnd::Malformed);
     EXPECT_EQ(full.Visits.size(), (ASL_PACKET_CAPACITY - 16) / 16);
     EXPECT_NE(tree.Log().find("No end marker within the 80016 bytes of the packet\n"),
               std::string::npos);

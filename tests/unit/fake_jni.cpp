@@ -5,140 +5,98 @@
 
 FakeJni* FakeJni::current = nullptr;
 
+FakeObject* FakeJni::New(int which, int failAt, FakeObject::Kind kind) {
+    if (current->ExceptionPending) {
+        ++current->CallsWithException;
+    }
+    if (++current->calls[which] == failAt) {
+        current->ExceptionPending = true;
+        return nullptr;
+    }
+    current->heap.push_back(std::make_unique<FakeObject>());
+    current->heap.back()->kind = kind;
+    current->PeakLocalRefs = std::max(current->PeakLocalRefs, ++current->LiveLocalRefs);
+    return current->heap.back().get();
+}
+
+bool FakeJni::InBounds(jsize start, jsize length, size_t size) {
+    if (current->ExceptionPending) {
+        ++current->CallsWithException;
+    }
+    if (start >= 0 && length >= 0 && size_t(start) + size_t(length) <= size) {
+        return true;
+    }
+    ++current->OutOfBounds;
+    current->ExceptionPending = true;
+    return false;
+}
+
 FakeJni::FakeJni() : previous(current) {
-    table.FindClass = FindClassImpl;
-    table.GetObjectClass = GetObjectClassImpl;
-    table.DeleteLocalRef = DeleteLocalRefImpl;
-    table.ExceptionCheck = ExceptionCheckImpl;
-    table.NewLongArray = NewLongArrayImpl;
-    table.SetLongArrayRegion = SetLongArrayRegionImpl;
-    table.NewObjectArray = NewObjectArrayImpl;
-    table.SetObjectArrayElement = SetObjectArrayElementImpl;
-    table.NewString = NewStringImpl;
-    table.NewStringUTF = NewStringUTFImpl;
+    using Kind = FakeObject::Kind;
+    table.FindClass = [](JNIEnv*, const char* name) -> jclass {
+        FakeObject* type = New(0, current->FailFindClass, Kind::Class);
+        if (type != nullptr) {
+            type->className = name;
+        }
+        return reinterpret_cast<jclass>(type);
+    };
+    table.GetObjectClass = [](JNIEnv*, jobject object) -> jclass {
+        FakeObject* type = New(5, 0, Kind::Class);  // never fails
+        type->className = Object(object)->kind == Kind::LongArray ? "[J" : "?";
+        return reinterpret_cast<jclass>(type);
+    };
+    table.DeleteLocalRef = [](JNIEnv*, jobject object) {
+        current->LiveLocalRefs -= object != nullptr ? 1 : 0;
+    };
+    table.ExceptionCheck = [](JNIEnv*) -> jboolean {
+        return current->ExceptionPending ? JNI_TRUE : JNI_FALSE;
+    };
+    table.NewLongArray = [](JNIEnv*, jsize length) -> jlongArray {
+        FakeObject* array = New(1, current->FailNewLongArray, Kind::LongArray);
+        if (array != nullptr) {
+            array->longs.assign(length, 0);
+        }
+        return reinterpret_cast<jlongArray>(array);
+    };
+    table.SetLongArrayRegion = [](JNIEnv*, jlongArray array, jsize start, jsize length,
+                                  const jlong* values) {
+        FakeObject* target = Object(array);
+        if (InBounds(start, length, target->longs.size())) {
+            std::copy(values, values + length, target->longs.begin() + start);
+        }
+    };
+    table.NewObjectArray = [](JNIEnv*, jsize length, jclass type, jobject initial) {
+        FakeObject* array = New(2, current->FailNewObjectArray, Kind::ObjectArray);
+        if (array != nullptr) {
+            array->className = "[" + Object(type)->className;
+            array->elements.assign(length, Object(initial));
+        }
+        return reinterpret_cast<jobjectArray>(array);
+    };
+    table.SetObjectArrayElement = [](JNIEnv*, jobjectArray array, jsize index, jobject value) {
+        FakeObject* target = Object(array);
+        if (InBounds(index, 1, target->elements.size())) {
+            target->elements[index] = Object(value);
+        }
+    };
+    table.NewString = [](JNIEnv*, const jchar* units, jsize length) {
+        FakeObject* text = New(3, current->FailNewString, Kind::String);
+        if (text != nullptr) {
+            text->text.assign(units, units + length);
+        }
+        return reinterpret_cast<jstring>(text);
+    };
+    table.NewStringUTF = [](JNIEnv*, const char* utf) {
+        FakeObject* text = New(4, current->FailNewStringUTF, Kind::String);
+        if (text != nullptr) {
+            text->text.assign(utf, utf + std::strlen(utf));
+        }
+        return reinterpret_cast<jstring>(text);
+    };
     env.functions = &table;
     current = this;
 }
 
 FakeJni::~FakeJni() {
     current = previous;
-}
-
-bool FakeJni::Fails(int& calls, int failAt) {
-    ++calls;
-    if (calls != failAt) {
-        return false;
-    }
-    current->ExceptionPending = true;
-    return true;
-}
-
-void FakeJni::Enter() {
-    if (current->ExceptionPending) {
-        ++current->CallsWithException;
-    }
-}
-
-jobject FakeJni::NewLocal(std::unique_ptr<FakeObject> object) {
-    current->heap.push_back(std::move(object));
-    current->PeakLocalRefs = std::max(current->PeakLocalRefs, ++current->LiveLocalRefs);
-    return reinterpret_cast<jobject>(current->heap.back().get());
-}
-
-jclass JNICALL FakeJni::FindClassImpl(JNIEnv*, const char* name) {
-    Enter();
-    if (Fails(current->findClassCalls, current->FailFindClass)) {
-        return nullptr;
-    }
-    auto type = std::make_unique<FakeObject>();
-    type->className = name;
-    return static_cast<jclass>(NewLocal(std::move(type)));
-}
-
-jclass JNICALL FakeJni::GetObjectClassImpl(JNIEnv*, jobject object) {
-    Enter();
-    auto type = std::make_unique<FakeObject>();
-    type->className = Object(object)->kind == FakeObject::Kind::LongArray ? "[J" : "?";
-    return static_cast<jclass>(NewLocal(std::move(type)));
-}
-
-void JNICALL FakeJni::DeleteLocalRefImpl(JNIEnv*, jobject object) {
-    if (object != nullptr) {
-        --current->LiveLocalRefs;
-    }
-}
-
-jboolean JNICALL FakeJni::ExceptionCheckImpl(JNIEnv*) {
-    return current->ExceptionPending ? JNI_TRUE : JNI_FALSE;
-}
-
-jlongArray JNICALL FakeJni::NewLongArrayImpl(JNIEnv*, jsize length) {
-    Enter();
-    if (Fails(current->newLongArrayCalls, current->FailNewLongArray)) {
-        return nullptr;
-    }
-    auto array = std::make_unique<FakeObject>();
-    array->kind = FakeObject::Kind::LongArray;
-    array->longs.assign(length, 0);
-    return static_cast<jlongArray>(NewLocal(std::move(array)));
-}
-
-void JNICALL FakeJni::SetLongArrayRegionImpl(JNIEnv*, jlongArray array, jsize start, jsize length,
-                                             const jlong* values) {
-    Enter();
-    FakeObject* target = Object(array);
-    if (start < 0 || length < 0 ||
-        static_cast<size_t>(start) + static_cast<size_t>(length) > target->longs.size()) {
-        ++current->OutOfBounds;
-        current->ExceptionPending = true;
-        return;
-    }
-    std::copy(values, values + length, target->longs.begin() + start);
-}
-
-jobjectArray JNICALL FakeJni::NewObjectArrayImpl(JNIEnv*, jsize length, jclass elementClass,
-                                                 jobject initial) {
-    Enter();
-    if (Fails(current->newObjectArrayCalls, current->FailNewObjectArray)) {
-        return nullptr;
-    }
-    auto array = std::make_unique<FakeObject>();
-    array->kind = FakeObject::Kind::ObjectArray;
-    array->className = "[" + Object(elementClass)->className;
-    array->elements.assign(length, Object(initial));
-    return static_cast<jobjectArray>(NewLocal(std::move(array)));
-}
-
-void JNICALL FakeJni::SetObjectArrayElementImpl(JNIEnv*, jobjectArray array, jsize index,
-                                                jobject value) {
-    Enter();
-    FakeObject* target = Object(array);
-    if (index < 0 || static_cast<size_t>(index) >= target->elements.size()) {
-        ++current->OutOfBounds;
-        current->ExceptionPending = true;
-        return;
-    }
-    target->elements[index] = Object(value);
-}
-
-jstring JNICALL FakeJni::NewStringImpl(JNIEnv*, const jchar* units, jsize length) {
-    Enter();
-    if (Fails(current->newStringCalls, current->FailNewString)) {
-        return nullptr;
-    }
-    auto text = std::make_unique<FakeObject>();
-    text->kind = FakeObject::Kind::String;
-    text->text.assign(units, units + length);
-    return static_cast<jstring>(NewLocal(std::move(text)));
-}
-
-jstring JNICALL FakeJni::NewStringUTFImpl(JNIEnv*, const char* utf) {
-    Enter();
-    if (Fails(current->newStringUtfCalls, current->FailNewStringUTF)) {
-        return nullptr;
-    }
-    auto text = std::make_unique<FakeObject>();
-    text->kind = FakeObject::Kind::String;
-    text->text.assign(utf, utf + std::strlen(utf));
-    return static_cast<jstring>(NewLocal(std::move(text)));
 }

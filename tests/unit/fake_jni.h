@@ -51,27 +51,11 @@ class FakeJni {
     JNINativeInterface_ table{};
     JNIEnv env{};
     std::vector<std::unique_ptr<FakeObject>> heap;
-    int newLongArrayCalls = 0;
-    int newObjectArrayCalls = 0;
-    int newStringCalls = 0;
-    int newStringUtfCalls = 0;
-    int findClassCalls = 0;
+    // FindClass, NewLongArray, NewObjectArray, NewString, NewStringUTF, GetObjectClass
+    int calls[6]{};
 
-    static bool Fails(int& calls, int failAt);
-    static void Enter();
-    static jobject NewLocal(std::unique_ptr<FakeObject> object);
-
-    static jclass JNICALL FindClassImpl(JNIEnv*, const char* name);
-    static jclass JNICALL GetObjectClassImpl(JNIEnv*, jobject object);
-    static void JNICALL DeleteLocalRefImpl(JNIEnv*, jobject object);
-    static jboolean JNICALL ExceptionCheckImpl(JNIEnv*);
-    static jlongArray JNICALL NewLongArrayImpl(JNIEnv*, jsize length);
-    static void JNICALL SetLongArrayRegionImpl(JNIEnv*, jlongArray array, jsize start, jsize length,
-                                               const jlong* values);
-    static jobjectArray JNICALL NewObjectArrayImpl(JNIEnv*, jsize length, jclass elementClass,
-                                                   jobject initial);
-    static void JNICALL SetObjectArrayElementImpl(JNIEnv*, jobjectArray array, jsize index,
-                                                  jobject value);
-    static jstring JNICALL NewStringImpl(JNIEnv*, const jchar* units, jsize length);
-    static jstring JNICALL NewStringUTFImpl(JNIEnv*, const char* text);
+    // Counts a call; null for the call chosen to fail, else a new local reference.
+    static FakeObject* New(int which, int failAt, FakeObject::Kind kind);
+    // Stores outside the array raise the exception a JVM raises.
+    static bool InBounds(jsize start, jsize length, size_t size);
 };

@@ -17,6 +17,13 @@ namespace {
 class HwDumpTest : public ::testing::Test {
   protected:
     void TearDown() override { HwInfoPrintLevel = 0; }
+    // What one dump writes to a fresh log.
+    template <typename Dump>
+    std::string Logged(Dump dump) {
+        std::remove("../log/velhslot.slotmgr.hwinfo.log");
+        dump();
+        return Tree.Log();
+    }
     InstallTree Tree;
 };
 
@@ -24,12 +31,11 @@ class HwDumpTest : public ::testing::Test {
 
 TEST_F(HwDumpTest, HexDumpLinesKeepTheirWidth) {
     const std::string bytes = std::string("ABCDEFGHIJKLMNO\x7f~ 0123456789abcd") + '\0';
-    struct Case {
+    struct {
         const std::string& Buffer;
         uint32_t Length, Start, PerLine;
         std::string Log;
-    };
-    const std::vector<Case> cases = {
+    } const cases[] = {
         {bytes, 33, 0, 16,
          " 00000000:  41 42 43 44 45 46 47 48 - 49 4a 4b 4c 4d 4e 4f 7f  ABCDEFGH IJKLMNO.\r\n"
          " 00000010:  7e 20 30 31 32 33 34 35 - 36 37 38 39 61 62 63 64  ~ 012345 6789abcd\r\n"
@@ -39,19 +45,15 @@ TEST_F(HwDumpTest, HexDumpLinesKeepTheirWidth) {
         {bytes, 3, 30, 4, " 0000001e:  63 64 - 00     cd . \r\n"},
         {bytes, 0, 0, 16, ""},
     };
-    for (const Case& c : cases) {
-        std::remove("../log/velhslot.slotmgr.hwinfo.log");
-        DumpByteBuffer(c.Buffer.data(), c.Length, c.Start, c.PerLine);
-        EXPECT_EQ(Tree.Log(), c.Log) << c.Length;
+    for (const auto& c : cases) {
+        EXPECT_EQ(Logged([&] { DumpByteBuffer(c.Buffer.data(), c.Length, c.Start, c.PerLine); }),
+                  c.Log)
+            << c.Length;
     }
 }
 
 TEST_F(HwDumpTest, ConfigurationSpaceByHeaderType) {
-    struct Case {
-        uint8_t HeaderType;
-        std::string Expected;
-    };
-    const std::vector<Case> cases = {
+    const std::pair<uint8_t, std::string> cases[] = {
         {0x00, "\nType 0 PCI Configuration Space\n\n            VendorID:  0x1234\n"},
         {0x80, "             BAR[5]:  0x00000000\n       CardbusCisPtr:  0x00000000\n"},
         {0x81, "                 BIST:  0x00\n\n               BAR[0]:  0x00000000\n"},
@@ -60,14 +62,12 @@ TEST_F(HwDumpTest, ConfigurationSpaceByHeaderType) {
         {0x82, "      Range[3].Limit:  0x00000000\n       InterruptLine:  0x00\n"},
         {0x03, "\nDumpPciConfigSpace(); unknown header type: 0x03 (3)\n\n"},
     };
-    for (const Case& c : cases) {
-        std::remove("../log/velhslot.slotmgr.hwinfo.log");
+    for (const auto& [headerType, expected] : cases) {
         _PCI_CONFIG0 config{};
         config.VendorID = 0x1234;
-        config.HeaderType = c.HeaderType;
-        DumpPciConfigSpace(&config, 0);
-        const std::string log = Tree.Log();
-        EXPECT_NE(log.find(c.Expected), std::string::npos) << int(c.HeaderType) << log;
+        config.HeaderType = headerType;
+        const std::string log = Logged([&] { DumpPciConfigSpace(&config, 0); });
+        EXPECT_NE(log.find(expected), std::string::npos) << int(headerType) << log;
         EXPECT_EQ(log.find("OEM Specific Registers"), std::string::npos);
     }
 }
@@ -90,9 +90,9 @@ TEST_F(HwDumpTest, DecodedPacketEndsWhereTheWalkEnds) {
         {AslBuilder().Raw({'V', 'H', 'S', 'X'}), {"is not an ASL packet\n"}},
     };
     for (const Case& c : cases) {
-        std::remove("../log/velhslot.slotmgr.hwinfo.log");
-        DumpAslPacket(c.Packet.Packet().get(), static_cast<uint32_t>(c.Packet.Size()));
-        const std::string log = Tree.Log();
+        const std::string log = Logged([&] {
+            DumpAslPacket(c.Packet.Packet().get(), static_cast<uint32_t>(c.Packet.Size()));
+        });
         for (const std::string& expected : c.Expected) {
             EXPECT_NE(log.find(expected), std::string::npos) << expected << "\n" << log;
         }
@@ -116,14 +116,12 @@ TEST_F(HwDumpTest, CapabilityListIsBoundedAndNamed) {
         {0x00, 0x50, 7, 0x00, "", 0},
     };
     for (const Case& c : cases) {
-        std::remove("../log/velhslot.slotmgr.hwinfo.log");
         _PCI_CONFIG0 config{};
         config.Status = c.Status;
         config.CapabilitiesPtr = c.First;
         const uint8_t item[] = {c.Id, c.Next, 'A', 'B', 'C', 'D', 'E', 'F'};
         std::memcpy(config.DeviceSpecific + 0x10, item, sizeof(item));
-        DumpCapabilityList(&config);
-        const std::string log = Tree.Log();
+        const std::string log = Logged([&] { DumpCapabilityList(&config); });
         EXPECT_EQ(log.find(c.Expected), 0u) << log;
         size_t items = 0;
         for (size_t at = log.find("Capability List"); at != std::string::npos;

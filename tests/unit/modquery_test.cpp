@@ -62,11 +62,9 @@ TEST_F(ModQuery, SymbolListOfALoadedModule) {
     FakeModules().Modules.push_back({"bare", 1, {}, {}});
     EXPECT_EQ(GetModuleSymbols("bare", &list), 0);
     EXPECT_EQ(list.Buffer, nullptr);
-}
 
-TEST_F(ModQuery, SymbolListThatGrowsBetweenSizeAndReadIsReadAgain) {
+    // A list that grows between the size question and the read is read again.
     FakeModules().Modules.push_back({"late", 1, {{1, "first"}}, {{2, "second"}, {3, "third"}}});
-    ModuleSymbols list;
     ASSERT_EQ(GetModuleSymbols("late", &list), 3);
     EXPECT_STREQ(list.Name(2), "third");
 }
@@ -77,10 +75,7 @@ TEST_F(ModQuery, MalformedSymbolListsAreReadOnlyInsideTheBuffer) {
     // one pointing back into the entries, and a count claiming more entries than fit.
     RawImage.assign(2 * sizeof(module_symbol), '\0');
     size_t good = RawImage.size();
-    for (char c : std::string("ok")) {
-        RawImage.push_back(c);
-    }
-    RawImage.push_back('\0');
+    RawImage.insert(RawImage.end(), {'o', 'k', '\0'});
     PutEntry(0, 1, good);
     PutEntry(1, 2, RawImage.size() + 5);
     RawCount = 1000;
@@ -120,14 +115,11 @@ TEST_F(ModQuery, ModuleInfo) {
     EXPECT_EQ(info, nullptr);
     EXPECT_NE(Tree.Log().find("GetModuleInfo():  No info for module absent\n"), std::string::npos)
         << Tree.Log();
-}
 
-TEST_F(ModQuery, ShortInfoRecordLeavesTheRestZero) {
     // A kernel whose record is shorter than ours: the flags are read as zero, never past it.
     SysCalls().QueryModule = RawQueryModule;
     RawImage.assign(sizeof(unsigned long), '\x7f');
     RawCount = 0;
-    UniqueMalloc<module_info> info;
     ASSERT_TRUE(GetModuleInfo("short", &info));
     EXPECT_EQ(info->flags, 0ul);
     EXPECT_NE(info->addr, 0ul);

@@ -11,9 +11,11 @@
 
 namespace {
 
-std::vector<std::string> ReadLines(const std::string& path, int size) {
+using Strings = std::vector<std::string>;
+
+Strings ReadLines(const std::string& path, int size) {
     UniqueFile file(std::fopen(path.c_str(), "r"));
-    std::vector<std::string> lines;
+    Strings lines;
     char buffer[64] = "untouched";
     while (file != nullptr && getline(file.get(), buffer, size)) {
         lines.emplace_back(buffer);
@@ -21,8 +23,8 @@ std::vector<std::string> ReadLines(const std::string& path, int size) {
     return lines;
 }
 
-std::vector<std::string> Tokens(std::string text) {
-    std::vector<std::string> tokens;
+Strings Tokens(std::string text) {
+    Strings tokens;
     char* cursor = text.data();
     while (char* token = GetToken(&cursor)) {
         tokens.emplace_back(token);
@@ -37,20 +39,14 @@ std::vector<std::string> Tokens(std::string text) {
 
 TEST(Getline, ReadsEveryLineAndStopsOnEndOrError) {
     ScratchDir dir;
-    EXPECT_EQ(ReadLines(dir.Write("a", "one\ntwo\n"), 64),
-              (std::vector<std::string>{"one", "two"}));
-    // The last line without a line feed is handed out too.
-    EXPECT_EQ(ReadLines(dir.Write("b", "one\ntwo"), 64), (std::vector<std::string>{"one", "two"}));
-    // Longer lines come back in pieces of size - 1 bytes.
-    EXPECT_EQ(ReadLines(dir.Write("c", "abcdefg\nh\n"), 4),
-              (std::vector<std::string>{"abc", "def", "g", "h"}));
-    EXPECT_EQ(ReadLines(dir.Write("d", ""), 64), std::vector<std::string>{});
-
-    // A directory opens but cannot be read, and a one-byte buffer never reaches the end: both
-    // must end the loop rather than spin.
-    EXPECT_EQ(ReadLines(dir.Path(), 64), std::vector<std::string>{});
-    EXPECT_EQ(ReadLines(dir.Path("a"), 1), std::vector<std::string>{});
-
+    // The last line without a line feed is handed out too; longer lines come in size - 1 pieces.
+    EXPECT_EQ(ReadLines(dir.Write("a", "one\ntwo\n"), 64), (Strings{"one", "two"}));
+    EXPECT_EQ(ReadLines(dir.Write("b", "one\ntwo"), 64), (Strings{"one", "two"}));
+    EXPECT_EQ(ReadLines(dir.Write("c", "abcdefg\nh\n"), 4), (Strings{"abc", "def", "g", "h"}));
+    EXPECT_EQ(ReadLines(dir.Write("d", ""), 64), Strings{});
+    // A directory cannot be read, a one-byte buffer never reaches the end: neither may spin.
+    EXPECT_EQ(ReadLines(dir.Path(), 64), Strings{});
+    EXPECT_EQ(ReadLines(dir.Path("a"), 1), Strings{});
     // At the end the buffer keeps the previous line.
     UniqueFile file(std::fopen(dir.Path("a").c_str(), "r"));
     char buffer[16];
@@ -60,57 +56,49 @@ TEST(Getline, ReadsEveryLineAndStopsOnEndOrError) {
     EXPECT_STREQ(buffer, "two");
 }
 
-TEST(TrimLine, CutsTheFirstCommentAndTrims) {
-    std::string text = "// only a comment";
-    EXPECT_STREQ(TrimLine(text.data()), "");
-    text = "  a //b// c ";
-    EXPECT_STREQ(TrimLine(text.data()), "a");
-    text = "path /";
-    EXPECT_STREQ(TrimLine(text.data()), "path /");
-    text = "/";
-    EXPECT_STREQ(TrimLine(text.data()), "/");
-    text = "";
-    EXPECT_STREQ(TrimLine(text.data()), "");
+TEST(Trim, LineCutsTheFirstCommentAndStrRemovesBlanksControlsAndHighBytes) {
+    for (auto [in, line, str] : {std::tuple{"// only a comment", "", "// only a comment"},
+                                 {"  a //b// c ", "a", "a //b// c"},
+                                 {"path /", "path /", "path /"},
+                                 {"/", "/", "/"},
+                                 {"", "", ""},
+                                 {" \t \r\n", "", ""},
+                                 {"\t\xE9 a b\xE9\r\t", "a b", "a b"},
+                                 {"x", "x", "x"}}) {
+        std::string text = in;
+        EXPECT_STREQ(TrimLine(text.data()), line) << in;
+        text = in;
+        EXPECT_STREQ(TrimStr(text.data()), str) << in;
+    }
 }
 
-TEST(TrimStr, RemovesBlanksControlsAndHighBytesAtBothEnds) {
-    std::string text = " \t \r\n";
-    EXPECT_STREQ(TrimStr(text.data()), "");
-    text = "\t\xE9 a b\xE9\r\t";
-    EXPECT_STREQ(TrimStr(text.data()), "a b");
-    text = "x";
-    EXPECT_STREQ(TrimStr(text.data()), "x");
-}
-
-TEST(GetToken, SplitsWordsQuotesAndBrackets) {
-    EXPECT_EQ(Tokens("bus \"two words\"  [x y]"),
-              (std::vector<std::string>{"bus", "two words", "[x y]"}));
-    // The byte after "]" is the delimiter and is dropped.
-    EXPECT_EQ(Tokens("[ab]c  d"), (std::vector<std::string>{"[ab]", "d"}));
-    // Tokens ending at the very end of the text: the cursor rests on the terminator.
-    EXPECT_EQ(Tokens("[ab]"), std::vector<std::string>{"[ab]"});
-    EXPECT_EQ(Tokens("\"q\""), std::vector<std::string>{"q"});
-    EXPECT_EQ(Tokens("a\tb\xE9\x01"
-                     "c   "),
-              (std::vector<std::string>{"a", "b", "c"}));
-    EXPECT_EQ(Tokens("\"\" x"), (std::vector<std::string>{"", "x"}));
-    EXPECT_EQ(Tokens(""), std::vector<std::string>{});
-
+TEST(GetToken, SplitsWordsQuotesAndBracketsAndReportsAMissingEnd) {
+    InstallTree tree;
+    const std::pair<const char*, Strings> cases[] = {
+        {"bus \"two words\"  [x y]", {"bus", "two words", "[x y]"}},
+        {"[ab]c  d", {"[ab]", "d"}},  // the byte after "]" is the delimiter and is dropped
+        {"[ab]", {"[ab]"}},           // the cursor rests on the terminator
+        {"\"q\"", {"q"}},
+        {"a\tb\xE9\x01"
+         "c   ",
+         {"a", "b", "c"}},
+        {"\"\" x", {"", "x"}},
+        {"", {}},
+        {"name \"open quote", {"name", "open quote"}},
+        {"[x y", {"[x y"}},
+    };
+    for (const auto& [text, tokens] : cases) {
+        EXPECT_EQ(Tokens(text), tokens) << text;
+    }
     char* null = nullptr;
     EXPECT_EQ(GetToken(&null), nullptr);
     EXPECT_EQ(GetToken(nullptr), nullptr);
-}
-
-TEST(GetToken, ReportsAMissingClosingDelimiterAndReturnsTheRest) {
-    InstallTree tree;
-    EXPECT_EQ(Tokens("name \"open quote"), (std::vector<std::string>{"name", "open quote"}));
-    EXPECT_EQ(Tokens("[x y"), std::vector<std::string>{"[x y"});
     EXPECT_EQ(tree.Log(),
               "GetToken(), missing end double quote: \"open quote\n"
               "GetToken(), missing end ']': [x y\n");
 }
 
-TEST(StrIsNum, AcceptsDecimalAndLowercaseHex) {
+TEST(Numbers, StrIsNumAndStrNumAndBoolWords) {
     for (const char* yes : {"123", "0x1f", "", "0x", "0"}) {
         EXPECT_EQ(StrIsNum(yes), 1) << yes;
     }
@@ -118,60 +106,46 @@ TEST(StrIsNum, AcceptsDecimalAndLowercaseHex) {
         EXPECT_EQ(StrIsNum(no), 0) << no;
     }
     EXPECT_EQ(StrIsNum(nullptr), -2);
-}
-
-TEST(StrNum, AccumulatesModulo32BitsAfterLowerCasing) {
-    std::string text = "0x1F";
-    EXPECT_EQ(StrNum(text.data()), 31);
-    EXPECT_EQ(text, "0x1f");
-    text = "42";
-    EXPECT_EQ(StrNum(text.data()), 42);
-    text = "4x";
-    EXPECT_EQ(StrNum(text.data()), 112);
-    text = "0xFFFFFFFF";
-    EXPECT_EQ(StrNum(text.data()), -1);
-    // Past 32 bits the value wraps as on the original target.
-    text = "99999999999";
-    EXPECT_EQ(StrNum(text.data()), 1215752191);
-    text = "0x123456789";
-    EXPECT_EQ(StrNum(text.data()), 0x23456789);
-    text = "";
-    EXPECT_EQ(StrNum(text.data()), 0);
-}
-
-TEST(BoolStr, KnowsTheSixWords) {
-    for (const char* word : {"0", "1", "t", "f", "true", "false"}) {
-        EXPECT_TRUE(IsBoolStr(word)) << word;
+    // Lower-cased in place, accumulated modulo 32 bits as on the original target.
+    for (auto [in, value, after] : {std::tuple{"0x1F", 31, "0x1f"},
+                                    {"42", 42, "42"},
+                                    {"4x", 112, "4x"},
+                                    {"0xFFFFFFFF", -1, "0xffffffff"},
+                                    {"99999999999", 1215752191, "99999999999"},
+                                    {"0x123456789", 0x23456789, "0x123456789"},
+                                    {"", 0, ""}}) {
+        std::string text = in;
+        EXPECT_EQ(StrNum(text.data()), value) << in;
+        EXPECT_EQ(text, after);
     }
-    for (const char* word : {"yes", "TRUE", "", "true "}) {
-        EXPECT_FALSE(IsBoolStr(word)) << word;
-        EXPECT_FALSE(EvalBoolStr(word)) << word;
-    }
-    for (const char* word : {"1", "t", "true"}) {
-        EXPECT_TRUE(EvalBoolStr(word)) << word;
-    }
-    for (const char* word : {"0", "f", "false"}) {
-        EXPECT_FALSE(EvalBoolStr(word)) << word;
+    for (auto [word, is, value] : {std::tuple{"0", true, false},
+                                   {"1", true, true},
+                                   {"t", true, true},
+                                   {"f", true, false},
+                                   {"true", true, true},
+                                   {"false", true, false},
+                                   {"yes", false, false},
+                                   {"TRUE", false, false},
+                                   {"", false, false},
+                                   {"true ", false, false}}) {
+        EXPECT_EQ(IsBoolStr(word), is) << word;
+        EXPECT_EQ(EvalBoolStr(word), value) << word;
     }
 }
 
 TEST(Ustrl, ConvertsInThe32BitRange) {
-    uint32_t value = 77;
-    EXPECT_TRUE(ustrl("0", &value, 10));
-    EXPECT_EQ(value, 0u);
-    EXPECT_TRUE(ustrl("12ab", &value, 10));
-    EXPECT_EQ(value, 12u);
-    EXPECT_TRUE(ustrl("0x1F", &value, 16));
-    EXPECT_EQ(value, 31u);
-    EXPECT_TRUE(ustrl(" 7", &value, 0));
-    EXPECT_EQ(value, 7u);
-    EXPECT_TRUE(ustrl("4294967295", &value, 10));
-    EXPECT_EQ(value, 4294967295u);
     // A sign negates as strtoul does on the 32-bit target.
-    EXPECT_TRUE(ustrl("-1", &value, 10));
-    EXPECT_EQ(value, 0xFFFFFFFFu);
-
-    value = 77;
+    for (auto [text, base, expected] : {std::tuple{"0", 10, 0u},
+                                        {"12ab", 10, 12u},
+                                        {"0x1F", 16, 31u},
+                                        {" 7", 0, 7u},
+                                        {"4294967295", 10, 4294967295u},
+                                        {"-1", 10, 0xFFFFFFFFu}}) {
+        uint32_t value = 77;
+        EXPECT_TRUE(ustrl(text, &value, base)) << text;
+        EXPECT_EQ(value, expected) << text;
+    }
+    uint32_t value = 77;
     for (const char* bad :
          {"x", "", "4294967296", "18446744073709551616", "-4294967296", "--1", "- 1"}) {
         EXPECT_FALSE(ustrl(bad, &value, 10)) << bad;

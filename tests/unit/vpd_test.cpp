@@ -6,6 +6,7 @@
 #include <string>
 
 #include "adapters/linvpd.h"
+#include "filehandle.h"
 #include "scratchdir.h"
 #include "util/sysaccess.h"
 
@@ -26,15 +27,10 @@ _VPD_LAYOUT Record(const char* typeModel) {
 class VpdTest : public ::testing::Test {
   protected:
     void SetUp() override {
-        ValidVPD = false;
-        std::memset(&Vpd, 0, sizeof(Vpd));
-        Image = Tree.Scratch().Path("mem");
-        SysPaths().DevMem = Image;
+        TearDown();
         // A sparse memory image that ends with the BIOS segment.
-        FILE* image = std::fopen(Image.c_str(), "wb");
-        ASSERT_NE(image, nullptr);
-        ASSERT_EQ(ftruncate(fileno(image), VPD_SEGMENT_OFFSET + VPD_SEGMENT_SIZE), 0);
-        std::fclose(image);
+        SysPaths().DevMem = Image = Tree.Scratch().Write("mem", "");
+        ASSERT_EQ(truncate(Image.c_str(), VPD_SEGMENT_OFFSET + VPD_SEGMENT_SIZE), 0);
     }
     void TearDown() override {
         ResetSystemAccess();
@@ -42,72 +38,64 @@ class VpdTest : public ::testing::Test {
         std::memset(&Vpd, 0, sizeof(Vpd));
     }
     // Writes bytes at an offset within the segment, cut at the image's end.
-    void Put(uint32_t offset, const void* bytes, size_t length) {
-        FILE* image = std::fopen(Image.c_str(), "r+b");
+    void Put(uint32_t offset, const void* bytes, size_t length = sizeof(_VPD_LAYOUT)) {
+        UniqueFile image(std::fopen(Image.c_str(), "r+b"));
         ASSERT_NE(image, nullptr);
         length = std::min<size_t>(length, VPD_SEGMENT_SIZE - offset);
-        ASSERT_EQ(std::fseek(image, VPD_SEGMENT_OFFSET + offset, SEEK_SET), 0);
-        ASSERT_EQ(std::fwrite(bytes, 1, length, image), length);
-        std::fclose(image);
+        ASSERT_EQ(std::fseek(image.get(), VPD_SEGMENT_OFFSET + offset, SEEK_SET), 0);
+        ASSERT_EQ(std::fwrite(bytes, 1, length, image.get()), length);
     }
-    void Put(uint32_t offset, const _VPD_LAYOUT& record) { Put(offset, &record, sizeof(record)); }
-
+    void Expect(bool found, const _VPD_LAYOUT& record) {
+        _VPD_LAYOUT out;
+        std::memset(&out, 0x11, sizeof(out));
+        EXPECT_EQ(GetVPD(&out), found);
+        EXPECT_EQ(ValidVPD, found);
+        EXPECT_EQ(std::memcmp(&out, &record, sizeof(out)), 0);  // else untouched
+    }
     InstallTree Tree;
     std::string Image;
 };
 
-TEST_F(VpdTest, TakesTheRecordAtTheLowestOffset) {
+TEST_F(VpdTest, TakesTheRecordAtTheLowestOffsetThatFitsWhollyInTheSegment) {
+    _VPD_LAYOUT untouched;
+    std::memset(&untouched, 0x11, sizeof(untouched));
+    Expect(false, untouched);
+    EXPECT_EQ(Tree.Log(), "");  // no message for a missing record
+
+    const _VPD_LAYOUT last = Record("1234XYZ");
+    Put(VPD_SEGMENT_SIZE - sizeof(_VPD_LAYOUT) + 1, &last);  // its last byte would lie outside
+    Expect(false, untouched);
+    Put(VPD_SEGMENT_SIZE - sizeof(_VPD_LAYOUT), &last);  // exactly the last place that fits
+    Expect(true, last);
+
     const _VPD_LAYOUT low = Record("K740AAA");
-    Put(0x1234, low);
-    Put(0x8000, Record("K740BBB"));
+    const _VPD_LAYOUT high = Record("K740BBB");
+    Put(0x1234, &low);
+    Put(0x8000, &high);
     // Header bytes followed by another signature are no record.
     Put(0x0100, "\xAA\x55VPX", 5);
     Put(0x0200, "\xAA\x54VPD", 5);
-    _VPD_LAYOUT out;
-    ASSERT_TRUE(GetVPD(&out));
-    EXPECT_TRUE(ValidVPD);
-    EXPECT_EQ(std::memcmp(&out, &low, sizeof(out)), 0);
+    Expect(true, low);
     EXPECT_EQ(Tree.Log(), "");
 }
 
-TEST_F(VpdTest, ARecordMustFitWhollyInTheSegment) {
-    _VPD_LAYOUT out;
-    std::memset(&out, 0x11, sizeof(out));
-    const _VPD_LAYOUT last = Record("1234XYZ");
-    Put(VPD_SEGMENT_SIZE - sizeof(_VPD_LAYOUT) + 1, last);  // its last byte would lie outside
-    EXPECT_FALSE(GetVPD(&out));
-    EXPECT_FALSE(ValidVPD);
-    EXPECT_EQ(out.Header1, 0x11);  // untouched
-
-    Put(VPD_SEGMENT_SIZE - sizeof(_VPD_LAYOUT), last);  // exactly the last place that fits
-    ASSERT_TRUE(GetVPD(&out));
-    EXPECT_EQ(std::memcmp(&out, &last, sizeof(out)), 0);
-}
-
-TEST_F(VpdTest, NoRecordLeavesEverythingAsItWasAndIsSearchedAgain) {
-    EXPECT_FALSE(GetVPD(&Vpd));
-    EXPECT_FALSE(ValidVPD);
-    EXPECT_EQ(Tree.Log(), "");  // no message for a missing record
-
+TEST_F(VpdTest, AFoundRecordStaysWhenALaterSearchFails) {
     const _VPD_LAYOUT record = Record("7890ABC");
-    Put(0x40, record);
+    Put(0x40, &record);
     ASSERT_TRUE(GetVPD(&Vpd));
-    EXPECT_EQ(std::memcmp(&Vpd, &record, sizeof(Vpd)), 0);
-
-    // Once found the record stays, even when a later search fails.
     SysPaths().DevMem = Tree.Scratch().Path("missing");
     EXPECT_FALSE(GetVPD(&Vpd));
     EXPECT_TRUE(ValidVPD);
     EXPECT_EQ(std::memcmp(&Vpd, &record, sizeof(Vpd)), 0);
-    EXPECT_NE(
-        Tree.Log().find("GetVPD():  error opening memory file " + Tree.Scratch().Path("missing")),
-        std::string::npos)
+    EXPECT_NE(Tree.Log().find("GetVPD():  error opening memory file " + SysPaths().DevMem),
+              std::string::npos)
         << Tree.Log();
-}
 
-TEST_F(VpdTest, AShortImageIsAReadFailure) {
+    // A short image is a read failure.
+    ValidVPD = false;
+    SysPaths().DevMem = Image;
     ASSERT_EQ(truncate(Image.c_str(), VPD_SEGMENT_OFFSET + 100), 0);
-    Put(0, Record("1111222"));
+    Put(0, &record);
     _VPD_LAYOUT out;
     EXPECT_FALSE(GetVPD(&out));
     EXPECT_FALSE(ValidVPD);
