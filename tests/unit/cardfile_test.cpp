@@ -3,8 +3,6 @@
 #include <gtest/gtest.h>
 
 #include <algorithm>
-#include <fstream>
-#include <iterator>
 #include <string>
 
 #include "cardfile/spclcase.h"
@@ -16,11 +14,6 @@ namespace {
 
 std::string Narrow(const std::wstring& text) {
     return std::string(text.begin(), text.end());
-}
-
-std::string Data(const std::string& name) {
-    std::ifstream in(CARDFILE_TEST_DATA "/" + name, std::ios::binary);
-    return std::string(std::istreambuf_iterator<char>(in), std::istreambuf_iterator<char>());
 }
 
 // A line per adapter, in list order; -1 for none.
@@ -53,13 +46,13 @@ class CardFileTest : public ::testing::Test {
     // Reads the data file NAME.crd as the card file, with a fresh log; then compares the list
     // and the log with NAME.adapters and NAME.log.
     int Read(const std::string& name) {
-        Tree.Scratch().Write("inst/velhadp.crd", Data(name + ".crd"));
+        Tree.Scratch().Write("inst/velhadp.crd", TestData("cardfile/" + name + ".crd"));
         ResetDebugOut();
         return GetAdapterFile();
     }
     void ExpectData(const std::string& name, ObjListTemp<AdapterDescriptor>& list) {
-        EXPECT_EQ(Describe(list), Data(name + ".adapters"));
-        EXPECT_EQ(Tree.Log(), Data(name + ".log"));
+        EXPECT_EQ(Describe(list), TestData("cardfile/" + name + ".adapters"));
+        EXPECT_EQ(Tree.Log(), TestData("cardfile/" + name + ".log"));
     }
     InstallTree Tree;
 };

@@ -1,5 +1,5 @@
-// A slot driver behind the ioctl seam: answers the four requests from its fields, fails a
-// chosen one, and records what it was sent.
+// A slot driver behind the ioctl seam: answers the version and table requests from its fields,
+// fails a chosen request with EIO, and records what it was sent.
 #pragma once
 
 #include <algorithm>
@@ -16,11 +16,7 @@ struct FakeDriver {
     std::vector<uint8_t> Table;  // its size answers the size request
     uint32_t DeliveredSize = 0;  // size answered after the table request; 0: the buffer's size
     unsigned long FailRequest = 0;
-    int FailErrno = EIO;
-
     std::vector<unsigned long> Requests;
-    std::vector<_VELH_TABLE_XFER> Transfers;  // as sent
-    _VELH_BLINK Blink{};
 
     // Makes this the driver behind SysCalls().Ioctl.
     void Install() {
@@ -48,24 +44,18 @@ struct FakeDriver {
         driver.Requests.push_back(request);
         auto* transfer = static_cast<_VELH_TABLE_XFER*>(argument);
         if (request == driver.FailRequest) {
-            errno = driver.FailErrno;
+            errno = EIO;
             return -1;
         }
         if (request == VELH_IOCTL_VERSION) {
             *static_cast<_VELH_VERSION*>(argument) = driver.Version;
         } else if (request == VELH_IOCTL_TABLE_SIZE) {
-            driver.Transfers.push_back(*transfer);
             transfer->Size = static_cast<uint32_t>(driver.Table.size());
         } else if (request == VELH_IOCTL_TABLE) {
             // Fills no more than the buffer it was given, then reports its own size.
-            driver.Transfers.push_back(*transfer);
             std::memcpy(transfer->Buffer, driver.Table.data(),
                         std::min<size_t>(transfer->Size, driver.Table.size()));
-            if (driver.DeliveredSize != 0) {
-                transfer->Size = driver.DeliveredSize;
-            }
-        } else if (request == VELH_IOCTL_BLINK) {
-            driver.Blink = *static_cast<_VELH_BLINK*>(argument);
+            transfer->Size = driver.DeliveredSize != 0 ? driver.DeliveredSize : transfer->Size;
         } else {
             errno = EINVAL;
             return -1;
