@@ -31,7 +31,7 @@ class HwDebugTest : public ::testing::Test {
 
 }  // namespace
 
-TEST_F(HwDebugTest, LevelFileLines) {
+TEST_F(HwDebugTest, LevelFileLinesAndTheHelpBlock) {
     const std::vector<std::pair<const char*, uint32_t>> cases = {
         {"", 0},
         {"HWDBGPRINT 0X10010 // dumps\n", 0x00010010},
@@ -72,10 +72,10 @@ TEST_F(HwDebugTest, LevelFileLines) {
         mkdir(tree.InstFile("dbgprint").c_str(), 0700);
     }
     EXPECT_EQ(tree.Log(), "");
-}
 
-TEST_F(HwDebugTest, ResetStartsANewLogWithTheHelpBlock) {
+    // A reset starts a new log; the help bit asks for the help block.
     dbgprint("from the previous acquisition\n");
+    ASSERT_EQ(rmdir(tree.InstFile("dbgprint").c_str()), 0);
     tree.Scratch().Write("inst/dbgprint", "hwdbgprint 0x80000000\n");
     ResetDebugOut();
     GetDebugPrintLevel(0);
@@ -189,7 +189,8 @@ int CallVarargs(wchar_t* out, unsigned int size, wchar_t* format, ...) {
 
 }  // namespace
 
-TEST(Varargs, RewritesOnlyBarePercentSAndAlwaysTerminates) {
+// varargs rewrites only a bare %s and always terminates.
+TEST(Varargs, AndHexToAscii) {
     wchar_t format[] = L"s%s %-5s %S %d";
     wchar_t out[64];
     EXPECT_EQ(CallVarargs(out, 64, format, L"w", "n", L"x", 7), 12);
@@ -206,15 +207,14 @@ TEST(Varargs, RewritesOnlyBarePercentSAndAlwaysTerminates) {
     EXPECT_STREQ(small, L"");
     EXPECT_LT(CallVarargs(small, 4, nullptr), 0);
     EXPECT_STREQ(small, L"");
-}
 
-TEST(HexToAscii, WritesTheLowDigitsWithoutTerminator) {
-    char out[12] = "..........";
-    EXPECT_EQ(HexToAscii(0x1a2b, out, 2), 2);
-    EXPECT_STREQ(out, "2b........");
-    EXPECT_EQ(HexToAscii(0xDEADBEEF, out, 10), 10);
-    EXPECT_STREQ(out, "00deadbeef");
-    EXPECT_EQ(HexToAscii(0x1, out, 0), 0);
-    EXPECT_EQ(HexToAscii(0x1, out, -3), 0);
-    EXPECT_STREQ(out, "00deadbeef");
+    // HexToAscii writes the low digits, without terminator.
+    char hex[12] = "..........";
+    EXPECT_EQ(HexToAscii(0x1a2b, hex, 2), 2);
+    EXPECT_STREQ(hex, "2b........");
+    EXPECT_EQ(HexToAscii(0xDEADBEEF, hex, 10), 10);
+    EXPECT_STREQ(hex, "00deadbeef");
+    EXPECT_EQ(HexToAscii(0x1, hex, 0), 0);
+    EXPECT_EQ(HexToAscii(0x1, hex, -3), 0);
+    EXPECT_STREQ(hex, "00deadbeef");
 }
