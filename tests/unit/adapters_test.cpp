@@ -54,8 +54,26 @@ TEST(CapabilityWalk, ReadsKnownItemsWithinTheImageAndDerivesPciX) {
             << length;
         EXPECT_EQ(GetCap(Image(image), CAP_PCIX, 0x40), nullptr);
     }
+    // Nothing is read from an offset outside the image.
+    std::string image(PCI_CONFIG_SIZE, '\0');
+    const std::string path = tree.Scratch().Write("cfg", Config(64, 0, {}));
+    EXPECT_EQ(GetPciConfig(path.c_str(), -1, 256, image.data()), 0);
+    EXPECT_EQ(GetPciConfig(path.c_str(), 64, 256, image.data()), 0);
+    EXPECT_NE(tree.Log().find("nothing above offset 0x40"), std::string::npos);
     EXPECT_NE(tree.Log().find("cut after 48 items"), std::string::npos);
     EXPECT_NE(tree.Log().find("item at 0xf4 reaches past"), std::string::npos);
+
+    // A bridge, by header type or by base class, is not identified by its subsystem registers.
+    for (auto [at, value, id] : {std::tuple{0x0E, 0, L"12340000567800ab05"},
+                                 {0x0E, 1, L"123400000000000005"},
+                                 {0x0B, 6, L"123400000000000005"}}) {
+        const std::string bytes = Config(
+            256, 0,
+            {{0, 0x34}, {1, 0x12}, {8, 5}, {0x2C, 0x78}, {0x2D, 0x56}, {0x2E, 0xab}, {at, value}});
+        AdapterDescriptor adapter;
+        StorePciConfig(Image(bytes), &adapter, 64);
+        EXPECT_EQ(adapter.PciId, id);
+    }
 }
 
 TEST(ProcBusPci, BusFoldersAndFunctionFiles) {

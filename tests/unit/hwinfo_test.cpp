@@ -67,6 +67,7 @@ TEST_F(HwInfoTest, ATableFromTheDriverIsStoredAndEachAcquisitionStartsAfresh) {
     }
     Tree.Scratch().Write("pci/03/01.0", "short");
     Tree.Scratch().Write("pci/03/02.0", std::string(64, '\0'));
+    Tree.Scratch().Write("pci/devices", "");
     // Declared: a new description of slot 5's adapter, and twice an adapter for slot 9, which
     // no slot has. Each list destroys its own descriptors, acquisition after acquisition.
     const std::string record = " 0 33 8 32 0 0 0 0123456789abcdef01 drv ";

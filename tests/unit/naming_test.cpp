@@ -147,6 +147,7 @@ TEST_F(Naming, BootDeviceFromTheInitialRamDiskModules) {
         {"INITRD_MODULES=\"e1000\n", "e1000", true},  // one double quote
         {"INITRD_MODULES_X=\"a\" # \"e1000\"\nINITRD_MODULES=\"b e1000\"", "e1000", true},
         {"INITRD_MODULES=\"ehci_pci\"\n", "ehci-pci", true},
+        {"INITRD_MODULES=\"reiserfs\" e1000\n", "e1000", false},  // after the list
     };
     for (const auto& c : cases) {
         Tree.Scratch().Write("kernel", c.Sysconfig);
