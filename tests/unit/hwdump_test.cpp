@@ -5,7 +5,6 @@
 #include <gtest/gtest.h>
 
 #include <cstring>
-#include <regex>
 #include <string>
 
 #include "aslbuilder.h"
@@ -54,7 +53,9 @@ TEST(HwDump, DumpsWriteTheDataFile) {
         DumpCapabilityList(&config);
     }
     // The refused packet's address, masked.
-    const std::string log =
-        std::regex_replace(tree.Log(), std::regex("at 0x[0-9a-f]{8} "), "at ADDRESS ");
+    std::string log = tree.Log();
+    const size_t address = log.find("Packet at 0x");
+    ASSERT_NE(address, std::string::npos);
+    log.replace(address + 10, 10, "ADDRESS");
     EXPECT_EQ(log, TestData("hwdump.log"));
 }

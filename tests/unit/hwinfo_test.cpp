@@ -3,7 +3,6 @@
 #include <gtest/gtest.h>
 #include <sys/stat.h>
 
-#include <regex>
 #include <string>
 #include <vector>
 
@@ -79,8 +78,10 @@ TEST_F(HwInfoTest, ATableFromTheDriverIsStoredAndEachAcquisitionStartsAfresh) {
         AdapterIndex = 9;
         EXPECT_TRUE(GetHwInfo());
         EXPECT_EQ(AdapterIndex, 2u);
-        const std::string log =
-            std::regex_replace(Tree.Log(), std::regex(Tree.Scratch().Path()), "SCRATCH");
+        std::string log = Tree.Log();
+        for (size_t at; (at = log.find(Tree.Scratch().Path())) != std::string::npos;) {
+            log.replace(at, Tree.Scratch().Path().size(), "SCRATCH");
+        }
         EXPECT_EQ(log, TestData("hwinfo.log"));
     }
 }
