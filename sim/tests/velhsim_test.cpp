@@ -1,0 +1,217 @@
+// velhsim as its users meet it: what a command sees, where it runs, what it returns, and what stays
+// untouched.
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <chrono>
+#include <filesystem>
+#include <sstream>
+#include <thread>
+
+#include "sim/common/textfile.h"
+#include "sim/launcher/argpaths.h"
+#include "sim/launcher/process.h"
+#include "tests/unit/scratchdir.h"
+
+namespace velhsim::test {
+namespace {
+
+namespace fs = std::filesystem;
+using ::testing::HasSubstr;
+
+struct RunResult {
+    int Status;
+    std::string Out;
+    std::string Err;
+};
+
+// Runs a program to its end in `dir`.
+RunResult Execute(std::vector<std::string> command, const std::string& dir = ".") {
+    const ScratchDir output;
+    command.insert(
+        command.begin(),
+        {"sh", "-c", "exec \"$@\" </dev/null >" + output.Path("out") + " 2>" + output.Path("err"),
+         "sh"});
+    const int status = RunProgram(command, dir);
+    return {status, output.Read("out"), output.Read("err")};
+}
+
+RunResult RunVelhsim(std::vector<std::string> arguments, const std::string& dir = ".") {
+    arguments.insert(arguments.begin(), VELHSIM_LAUNCHER);
+    return Execute(arguments, dir);
+}
+
+// A copy of the test machine (the folder `machine` beside this file) in `dir`.
+std::string CopyTestMachine(const ScratchDir& dir) {
+    fs::copy(VELHSIM_TEST_MACHINE, dir.Path("machine"), fs::copy_options::recursive);
+    return dir.Path("machine");
+}
+
+std::string Read(const std::string& path) {
+    return ReadWholeFile(path).value_or("");
+}
+
+// Every path below `root` with the contents of its files, to compare before and after a run.
+std::string Snapshot(const std::string& root) {
+    std::string snapshot;
+    for (const fs::directory_entry& entry : fs::recursive_directory_iterator(root)) {
+        snapshot += entry.path().string() + "\n" + Read(entry.path()) + "\n";
+    }
+    return snapshot;
+}
+
+// A transcript (transcripts/*.t) holds commands ("$ " lines), each followed by exactly what it
+// prints, and comments ("#" lines). The commands of each run in one sh under velhsim on a fresh
+// copy of the test machine, with the paths of the probe and the tools in $PROBE, $MKPCITREE,
+// $MKDEVMEM and $PCI2ASL; RUN stands for the run folder.
+TEST(Velhsim, PrintsWhatEachTranscriptSaysAndLeavesTheMachineAsItWas) {
+    for (const std::string name : {"machine.t", "driver.t", "modules.t", "tools.t"}) {
+        const ScratchDir dir;
+        const std::string machine = CopyTestMachine(dir);
+        const std::string before = Snapshot(machine);
+        std::istringstream transcript(Read(VELHSIM_TRANSCRIPTS "/" + name));
+        std::string expected;
+        std::string script = "PROBE=" VELHSIM_PROBE " PCI2ASL=" PCI2ASL " MKPCITREE=" MKPCITREE
+                             " MKDEVMEM=" MKDEVMEM "\n";
+        std::vector<std::string> commands;
+        for (std::string line; std::getline(transcript, line);) {
+            if (line.rfind('#', 0) != 0) {
+                expected += line + "\n";
+            }
+            if (line.rfind("$ ", 0) == 0) {
+                commands.push_back(line + "\n");
+                script += "echo '\036'\n" + line.substr(2) + "\n";
+            }
+        }
+        const RunResult result = RunVelhsim(
+            {"--machine", machine, "--run-dir", dir.Path("run"), "--", "sh", "-c", script});
+        // Each separator stands for the command whose output follows it.
+        std::string actual = result.Out;
+        size_t at = 0;
+        for (const std::string& command : commands) {
+            if ((at = actual.find("\036\n", at)) != std::string::npos) {
+                actual.replace(at, 2, command);
+            }
+        }
+        while ((at = actual.find(dir.Path("run"))) != std::string::npos) {
+            actual.replace(at, dir.Path("run").size(), "RUN");
+        }
+        EXPECT_EQ(actual, expected) << name;
+        EXPECT_EQ(result.Err, "") << name;
+        EXPECT_EQ(Snapshot(machine), before) << name;
+    }
+}
+
+TEST(Velhsim, ReturnsTheCommandsStatusAndRefusesWhatItCannotRun) {
+    const ScratchDir dir;
+    const std::string machine = CopyTestMachine(dir);
+    fs::create_directories(dir.Path("used/something"));
+    const std::string marker = dir.Path("ran");
+    const auto in = [&](const std::string& run, std::vector<std::string> command) {
+        command.insert(command.begin(), {VELHSIM_LAUNCHER, "--machine", machine, "--run-dir", run});
+        return command;
+    };
+    const struct {
+        std::vector<std::string> Command;
+        int Status;
+        std::string Err;
+    } cases[] = {
+        {in(dir.Path("a"), {"--", "sh", "-c", "exit 7"}), 7, ""},
+        {in(dir.Path("b"), {"--", "sh", "-c", "kill -9 $$"}), 128 + 9, ""},
+        {in(dir.Path("c"), {"--", "velhsim-no-such-cmd"}), 127, "cannot run velhsim-no-such-cmd"},
+        {in(dir.Path("used"), {"--", "touch", marker}), 125, "is not a new or empty folder"},
+        {in(machine + "/run", {"--", "touch", marker}), 125, "lies inside the machine folder"},
+        {{VELHSIM_LAUNCHER, "--machine", dir.Path("none"), "--", "touch", marker},
+         125,
+         "no machine folder"},
+        {{VELHSIM_LAUNCHER, "--machine", machine}, 125, "usage:"},
+        // A user namespace of the test's own in which no mount namespace may be made.
+        {{"unshare", "--user", "--map-root-user", "sh", "-c",
+          "echo 0 > /proc/sys/user/max_mnt_namespaces && exec \"$@\"", "sh", VELHSIM_LAUNCHER,
+          "--machine", machine, "--run-dir", dir.Path("d"), "--", "touch", marker},
+         125,
+         "velhsim: cannot create a private mount namespace: No space left on device (a "
+         "namespace limit"},
+    };
+    for (const auto& c : cases) {
+        const RunResult result = Execute(c.Command);
+        EXPECT_EQ(result.Status, c.Status) << c.Command.back();
+        EXPECT_THAT(result.Err, HasSubstr(c.Err));
+    }
+    EXPECT_FALSE(fs::exists(marker) || fs::exists(machine + "/run") || fs::exists(dir.Path("d")));
+}
+
+TEST(Velhsim, MakesANamedRunFolderAndEndsWhatTheCommandLeftRunning) {
+    const ScratchDir dir;
+    const RunResult result =
+        RunVelhsim({"--machine", CopyTestMachine(dir), "--", "sh", "-c",
+                    "echo $VELHSIM_RUN; pwd; (sleep 1; touch $VELHSIM_RUN/survivor) &"});
+    ASSERT_EQ(result.Status, 0) << result.Err;
+    const std::string run = result.Out.substr(0, result.Out.find('\n'));
+    EXPECT_EQ(run.rfind("/tmp/velhsim.", 0), 0u) << run;
+    EXPECT_EQ(result.Out, run + "\n" + run + "/install\n");
+    EXPECT_THAT(result.Err, HasSubstr("velhsim: run folder " + run + "\n"));
+    std::this_thread::sleep_for(std::chrono::seconds(2));
+    EXPECT_TRUE(fs::exists(run + "/driver/asl.bin"));
+    EXPECT_FALSE(fs::exists(run + "/survivor"));
+    fs::remove_all(run);
+}
+
+TEST(Velhsim, ResolvesRelativeArgumentsFromWhereItStarted) {
+    const ScratchDir dir;
+    const std::string machine = CopyTestMachine(dir);
+    const std::string origin = dir.Path("origin");
+    for (const char* name :
+         {"data/x.txt", "build/agent.jar", "lib/a.jar", "tools/run", "dbgprint"}) {
+        fs::create_directories(fs::path(origin + "/" + name).parent_path());
+        dir.Write("origin/" + std::string(name), "#!/bin/sh\nprintf '%s\\n' \"$0\" \"$@\"\n");
+    }
+    fs::permissions(origin + "/tools/run", fs::perms::owner_exec, fs::perm_options::add);
+    // Options with a path, class path lists, the command; a name that also exists in the install
+    // folder (dbgprint) means the install folder's file.
+    const RunResult result = RunVelhsim(
+        {"--machine", machine, "--run-dir", dir.Path("run"), "--", "tools/run",
+         "-Djava.library.path=build", "-cp", "build/agent.jar:lib/a.jar:missing.jar", "/abs/build",
+         "com.example.Main", "build", "-Dx=", "LIST=data:nothing-here:data/x.txt", "dbgprint"},
+        origin);
+    EXPECT_EQ(result.Out, origin + "/tools/run\n-Djava.library.path=" + origin + "/build\n-cp\n" +
+                              origin + "/build/agent.jar:" + origin +
+                              "/lib/a.jar:missing.jar\n/abs/build\ncom.example.Main\n" + origin +
+                              "/build\n-Dx=\nLIST=" + origin + "/data:nothing-here:" + origin +
+                              "/data/x.txt\ndbgprint\n")
+        << result.Err;
+    // A command without a folder is left to PATH.
+    EXPECT_EQ(ResolveArguments({"build"}, origin, machine + "/install")[0], "build");
+}
+
+TEST(Velhsim, RunsUnprivilegedInAUserNamespace) {
+    if (geteuid() != 0) {
+        GTEST_SKIP() << "every other test already runs without root";
+    }
+    // Copies of the launcher, its preload library, the probe and a machine that the unprivileged
+    // user can reach.
+    const ScratchDir dir;
+    const std::string machine = CopyTestMachine(dir);
+    const std::string bin = dir.Path("bin");
+    fs::create_directories(bin);
+    const fs::path launcher = VELHSIM_LAUNCHER;
+    fs::copy(launcher, bin + "/velhsim");
+    fs::copy(launcher.parent_path() / "libvelhsim-preload.so", bin + "/libvelhsim-preload.so");
+    fs::copy(VELHSIM_PROBE, bin + "/probe");
+    fs::permissions(dir.Path(), fs::perms::all, fs::perm_options::add);
+    for (const fs::directory_entry& entry : fs::recursive_directory_iterator(dir.Path())) {
+        fs::permissions(entry.path(), fs::perms::others_read | fs::perms::others_exec,
+                        fs::perm_options::add);
+    }
+    const RunResult result =
+        Execute({"setpriv", "--reuid=65534", "--regid=65534", "--clear-groups", bin + "/velhsim",
+                 "--machine", machine, "--run-dir", dir.Path("run"), "--", "sh", "-c",
+                 "id -u; head -1 /etc/SuSE-release; " + bin + "/probe version; " + bin +
+                     "/probe uname; od -An -c -j $((0xF1234 + 2)) -N 3 /dev/mem"});
+    EXPECT_EQ(result.Out,
+              "65534\nSuSE SLES-8 (i386)\nversion 1.2.3\nrelease 2.4.19-64GB-SMP\n   V   P   D\n")
+        << result.Err;
+}
+
+}  // namespace
+}  // namespace velhsim::test
