@@ -47,15 +47,11 @@ std::string CopyTestMachine(const ScratchDir& dir) {
     return dir.Path("machine");
 }
 
-std::string Read(const std::string& path) {
-    return ReadWholeFile(path).value_or("");
-}
-
 // Every path below `root` with the contents of its files, to compare before and after a run.
 std::string Snapshot(const std::string& root) {
     std::string snapshot;
     for (const fs::directory_entry& entry : fs::recursive_directory_iterator(root)) {
-        snapshot += entry.path().string() + "\n" + Read(entry.path()) + "\n";
+        snapshot += entry.path().string() + "\n" + ReadWholeFile(entry.path()).value_or("") + "\n";
     }
     return snapshot;
 }
@@ -69,7 +65,7 @@ TEST(Velhsim, PrintsWhatEachTranscriptSaysAndLeavesTheMachineAsItWas) {
         const ScratchDir dir;
         const std::string machine = CopyTestMachine(dir);
         const std::string before = Snapshot(machine);
-        std::istringstream transcript(Read(VELHSIM_TRANSCRIPTS "/" + name));
+        std::istringstream transcript(*ReadWholeFile(VELHSIM_TRANSCRIPTS "/" + name));
         std::string expected;
         std::string script = "PROBE=" VELHSIM_PROBE " PCI2ASL=" PCI2ASL " MKPCITREE=" MKPCITREE
                              " MKDEVMEM=" MKDEVMEM "\n";
@@ -193,21 +189,18 @@ TEST(Velhsim, RunsUnprivilegedInAUserNamespace) {
     const ScratchDir dir;
     const std::string machine = CopyTestMachine(dir);
     const std::string bin = dir.Path("bin");
-    fs::create_directories(bin);
-    const fs::path launcher = VELHSIM_LAUNCHER;
-    fs::copy(launcher, bin + "/velhsim");
-    fs::copy(launcher.parent_path() / "libvelhsim-preload.so", bin + "/libvelhsim-preload.so");
-    fs::copy(VELHSIM_PROBE, bin + "/probe");
-    fs::permissions(dir.Path(), fs::perms::all, fs::perm_options::add);
-    for (const fs::directory_entry& entry : fs::recursive_directory_iterator(dir.Path())) {
-        fs::permissions(entry.path(), fs::perms::others_read | fs::perms::others_exec,
-                        fs::perm_options::add);
-    }
+    const std::string launcher = VELHSIM_LAUNCHER;
+    ASSERT_EQ(
+        Execute({"sh", "-c", "mkdir $0 && cp $1 $2 $3 $0 && chmod -R a+rX $4 && chmod a+w $4", bin,
+                 launcher, launcher.substr(0, launcher.rfind('/')) + "/libvelhsim-preload.so",
+                 VELHSIM_PROBE, dir.Path()})
+            .Status,
+        0);
     const RunResult result =
         Execute({"setpriv", "--reuid=65534", "--regid=65534", "--clear-groups", bin + "/velhsim",
                  "--machine", machine, "--run-dir", dir.Path("run"), "--", "sh", "-c",
-                 "id -u; head -1 /etc/SuSE-release; " + bin + "/probe version; " + bin +
-                     "/probe uname; od -An -c -j $((0xF1234 + 2)) -N 3 /dev/mem"});
+                 "id -u; head -1 /etc/SuSE-release; " + bin + "/velhsim_probe version; " + bin +
+                     "/velhsim_probe uname; od -An -c -j $((0xF1234 + 2)) -N 3 /dev/mem"});
     EXPECT_EQ(result.Out,
               "65534\nSuSE SLES-8 (i386)\nversion 1.2.3\nrelease 2.4.19-64GB-SMP\n   V   P   D\n")
         << result.Err;
