@@ -1,10 +1,7 @@
-// velhsim_probe: makes the calls of the library's Linux layer for real, so that the simulator's
-// tests see what a command run under velhsim meets. One request per run; errors print as
-// "error NAME" with the errno's name.
-//   open | version | table [CAPACITY] | blink SLOT STATE | ioctl REQUEST   on /dev/velhpdrv; table
-//       asks for the size, then for the table into a buffer of CAPACITY (else the size) bytes
-//   qm NAME|- WHICH SIZE   query_module through the symbol that the process has
-//   uname                  the kernel release
+// velhsim_probe REQUEST [ARG...]: makes the calls of the library's Linux layer for real, so that
+// the simulator's tests see what a command under velhsim meets (sim/tests/transcripts): open,
+// version, table [CAPACITY], blink SLOT STATE and ioctl REQUEST on the slot driver's device;
+// qm NAME|- WHICH SIZE (query_module); uname. Errors print as "error NAME" with errno's name.
 #include <dlfcn.h>
 #include <fcntl.h>
 #include <sys/ioctl.h>
@@ -29,37 +26,12 @@ int Error() {
     return 1;
 }
 
-// One request on the open device, saying `done` when it succeeds.
-int Request(const UniqueFd& fd, unsigned long request, void* argument, const char* done) {
+// One request on the device, saying `done` when it succeeds.
+bool Request(const UniqueFd& fd, unsigned long request, void* argument, const char* done) {
     if (!fd || ioctl(fd.Get(), request, argument) != 0) {
-        return Error();
+        return Error() == 0;
     }
-    std::printf("%s", done);
-    return 0;
-}
-
-uint32_t Number(const char* text) {
-    return static_cast<uint32_t>(std::strtoul(text, nullptr, 0));
-}
-
-int Table(const UniqueFd& fd, const char* capacity) {
-    _VELH_TABLE_XFER transfer{};
-    if (Request(fd, VELH_IOCTL_TABLE_SIZE, &transfer, "size ") != 0) {
-        return 1;
-    }
-    std::printf("%u\n", transfer.Size);
-    transfer.Size = capacity != nullptr ? Number(capacity) : transfer.Size;
-    // One byte more, which shows whether the driver wrote past the table.
-    std::vector<unsigned char> buffer(transfer.Size + 1, 0xEE);
-    transfer.Buffer = buffer.data();
-    if (Request(fd, VELH_IOCTL_TABLE, &transfer, "table ") != 0) {
-        return 1;
-    }
-    std::printf("%u ", transfer.Size);
-    for (uint32_t i = 0; i <= transfer.Size; ++i) {
-        std::printf(i < transfer.Size ? "%02x" : " next %02x\n", buffer[i]);
-    }
-    return 0;
+    return std::printf("%s", done) >= 0;
 }
 
 int QueryModule(const char* name, int which, size_t capacity) {
@@ -68,10 +40,11 @@ int QueryModule(const char* name, int which, size_t capacity) {
     std::vector<unsigned long> words(capacity / sizeof(unsigned long) + 1);
     char* buffer = capacity != 0 ? reinterpret_cast<char*>(words.data()) : nullptr;
     size_t ret = 0;
+    errno = ENOSYS;
     const int result = query == nullptr ? -1
                                         : query(std::strcmp(name, "-") == 0 ? nullptr : name, which,
                                                 buffer, capacity, &ret);
-    const int error = query == nullptr ? ENOSYS : errno;
+    const int error = errno;
     std::printf("ret %zu\n", ret);
     errno = error;
     if (result != 0) {
@@ -95,7 +68,9 @@ int QueryModule(const char* name, int which, size_t capacity) {
 
 int main(int argc, char** argv) {
     const std::string command = argc > 1 ? argv[1] : "";
-    const auto number = [&](int i) { return i < argc ? Number(argv[i]) : 0; };
+    const auto number = [&](int i) {
+        return i < argc ? static_cast<uint32_t>(std::strtoul(argv[i], nullptr, 0)) : 0;
+    };
     if (command == "qm" && argc == 5) {
         return QueryModule(argv[2], static_cast<int>(number(3)), number(4));
     }
@@ -106,23 +81,39 @@ int main(int argc, char** argv) {
     const UniqueFd fd(open(VELHPDRV_DEVICE, O_RDWR));
     _VELH_VERSION version{};
     _VELH_BLINK blink{number(2), number(3)};
+    _VELH_TABLE_XFER transfer{};
     int other = 0;
     if (command == "open") {
         return fd ? (std::printf("open ok\n"), 0) : Error();
     }
-    if (command == "table") {
-        return Table(fd, argc > 2 ? argv[2] : nullptr);
-    }
     if (command == "version") {
-        return Request(fd, VELH_IOCTL_VERSION, &version, "version ") != 0
-                   ? 1
-                   : (std::printf("%d.%d.%d\n", version.Major, version.Minor, version.Patch), 0);
+        return Request(fd, VELH_IOCTL_VERSION, &version, "version ")
+                   ? (std::printf("%d.%d.%d\n", version.Major, version.Minor, version.Patch), 0)
+                   : 1;
+    }
+    if (command == "table") {
+        if (!Request(fd, VELH_IOCTL_TABLE_SIZE, &transfer, "size ")) {
+            return 1;
+        }
+        std::printf("%u\n", transfer.Size);
+        // One byte more than the driver is told, which shows whether it wrote past the table.
+        std::vector<unsigned char> buffer((argc > 2 ? number(2) : transfer.Size) + 1, 0xEE);
+        transfer.Size = static_cast<uint32_t>(buffer.size() - 1);
+        transfer.Buffer = buffer.data();
+        if (!Request(fd, VELH_IOCTL_TABLE, &transfer, "table ")) {
+            return 1;
+        }
+        std::printf("%u ", transfer.Size);
+        for (uint32_t i = 0; i <= transfer.Size; ++i) {
+            std::printf(i < transfer.Size ? "%02x" : " next %02x\n", buffer[i]);
+        }
+        return 0;
     }
     if (command == "blink") {
-        return Request(fd, VELH_IOCTL_BLINK, &blink, "blink ok\n");
+        return Request(fd, VELH_IOCTL_BLINK, &blink, "blink ok\n") ? 0 : 1;
     }
     if (command == "ioctl") {
-        return Request(fd, number(2), &other, "ioctl ok\n");
+        return Request(fd, number(2), &other, "ioctl ok\n") ? 0 : 1;
     }
     std::fprintf(stderr, "velhsim_probe: unknown request\n");
     return 2;

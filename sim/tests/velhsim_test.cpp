@@ -36,11 +36,6 @@ RunResult Execute(std::vector<std::string> command, const std::string& dir = "."
     return {status, output.Read("out"), output.Read("err")};
 }
 
-RunResult RunVelhsim(std::vector<std::string> arguments, const std::string& dir = ".") {
-    arguments.insert(arguments.begin(), VELHSIM_LAUNCHER);
-    return Execute(arguments, dir);
-}
-
 // A copy of the test machine (the folder `machine` beside this file) in `dir`.
 std::string CopyTestMachine(const ScratchDir& dir) {
     fs::copy(VELHSIM_TEST_MACHINE, dir.Path("machine"), fs::copy_options::recursive);
@@ -79,8 +74,8 @@ TEST(Velhsim, PrintsWhatEachTranscriptSaysAndLeavesTheMachineAsItWas) {
                 script += "echo '\036'\n" + line.substr(2) + "\n";
             }
         }
-        const RunResult result = RunVelhsim(
-            {"--machine", machine, "--run-dir", dir.Path("run"), "--", "sh", "-c", script});
+        const RunResult result = Execute({VELHSIM_LAUNCHER, "--machine", machine, "--run-dir",
+                                          dir.Path("run"), "--", "sh", "-c", script});
         // Each separator stands for the command whose output follows it.
         std::string actual = result.Out;
         size_t at = 0;
@@ -140,8 +135,8 @@ TEST(Velhsim, ReturnsTheCommandsStatusAndRefusesWhatItCannotRun) {
 TEST(Velhsim, MakesANamedRunFolderAndEndsWhatTheCommandLeftRunning) {
     const ScratchDir dir;
     const RunResult result =
-        RunVelhsim({"--machine", CopyTestMachine(dir), "--", "sh", "-c",
-                    "echo $VELHSIM_RUN; pwd; (sleep 1; touch $VELHSIM_RUN/survivor) &"});
+        Execute({VELHSIM_LAUNCHER, "--machine", CopyTestMachine(dir), "--", "sh", "-c",
+                 "echo $VELHSIM_RUN; pwd; (sleep 1; touch $VELHSIM_RUN/survivor) &"});
     ASSERT_EQ(result.Status, 0) << result.Err;
     const std::string run = result.Out.substr(0, result.Out.find('\n'));
     EXPECT_EQ(run.rfind("/tmp/velhsim.", 0), 0u) << run;
@@ -165,8 +160,8 @@ TEST(Velhsim, ResolvesRelativeArgumentsFromWhereItStarted) {
     fs::permissions(origin + "/tools/run", fs::perms::owner_exec, fs::perm_options::add);
     // Options with a path, class path lists, the command; a name that also exists in the install
     // folder (dbgprint) means the install folder's file.
-    const RunResult result = RunVelhsim(
-        {"--machine", machine, "--run-dir", dir.Path("run"), "--", "tools/run",
+    const RunResult result = Execute(
+        {VELHSIM_LAUNCHER, "--machine", machine, "--run-dir", dir.Path("run"), "--", "tools/run",
          "-Djava.library.path=build", "-cp", "build/agent.jar:lib/a.jar:missing.jar", "/abs/build",
          "com.example.Main", "build", "-Dx=", "LIST=data:nothing-here:data/x.txt", "dbgprint"},
         origin);
