@@ -13,10 +13,7 @@ static bool Inside(const char* pointer, const std::vector<char>& buffer) {
 static void CheckToken(char* token) {
     Check(!EvalBoolStr(token) || IsBoolStr(token),
           "EvalBoolStr is true for a text that is no boolean word");
-    if (StrIsNum(token) == 1) {
-        StrNum(token);
-    }
-    uint32_t value = 0;
+    uint32_t value = StrIsNum(token) == 1 ? StrNum(token) : 0;
     for (int base : {0, 10, 16}) {
         ustrl(token, &value, base);
     }

@@ -14,9 +14,7 @@ static std::string KernelRelease;
 // Fills the record the way a kernel would, except that a release too long for its field is
 // cut without a terminator.
 static int FakeUname(struct utsname* name) {
-    std::memset(name, 0, sizeof(*name));
-    std::strcpy(name->sysname, "Linux");
-    std::strcpy(name->machine, "i686");
+    *name = {"Linux", "", "", "", "i686"};
     std::strncpy(name->release, KernelRelease.c_str(), sizeof(name->release));
     return 0;
 }
@@ -45,9 +43,7 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
     ResetPreReqState();
     std::istringstream text(std::string(reinterpret_cast<const char*>(data), size));
     std::string lines[3];
-    for (std::string& line : lines) {
-        std::getline(text, line);
-    }
+    std::getline(std::getline(std::getline(text, lines[0]), lines[1]), lines[2]);
     KernelRelease = lines[1];
     WriteFile(SysPaths().Etc + "/SuSE-release", data, size);
     IdentifyOS();

@@ -57,12 +57,11 @@ extern "C" int LLVMFuzzerInitialize(int* argc, char*** argv) {
     }
     // The library opens and closes its log for every line: a tree in memory keeps that fast.
     const char* tmp = std::getenv("TMPDIR");
-    std::string pattern = tmp != nullptr && *tmp != '\0'         ? tmp
-                          : access("/dev/shm", W_OK | X_OK) == 0 ? "/dev/shm"
-                                                                 : "/tmp";
-    pattern += "/velhfuzz.XXXXXX";
-    Check(mkdtemp(pattern.data()) != nullptr, "cannot make a scratch directory " + pattern);
-    ScratchRoot = pattern;
+    ScratchRoot = std::string(tmp != nullptr && *tmp != '\0'         ? tmp
+                              : access("/dev/shm", W_OK | X_OK) == 0 ? "/dev/shm"
+                                                                     : "/tmp") +
+                  "/velhfuzz.XXXXXX";
+    Check(mkdtemp(ScratchRoot.data()) != nullptr, "cannot make a scratch directory " + ScratchRoot);
     std::atexit([] {
         std::error_code ignored;
         std::filesystem::remove_all(ScratchRoot, ignored);
@@ -100,14 +99,12 @@ void WriteFile(const std::string& path, const uint8_t* data, size_t size) {
 }
 
 FILE* InputStream(const uint8_t* data, size_t size) {
-    // The bytes and one more, so that an empty input still has a buffer to stream from.
-    static std::vector<char> bytes;
+    static std::string bytes;
     static FILE* stream = nullptr;
     if (stream != nullptr) {
         std::fclose(stream);
     }
     bytes.assign(data, data + size);
-    bytes.push_back('\0');
     stream = fmemopen(bytes.data(), size, "r");
     Check(stream != nullptr, "cannot make a stream of the input");
     return stream;

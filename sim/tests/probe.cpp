@@ -1,15 +1,7 @@
-// velhsim_probe: makes the calls of the library's Linux layer for real, so that the simulator's
-// tests can see what a command run under velhsim meets. One request per run; results go to
-// standard output, errors as "error NAME" with the errno's name.
-//
-//   open                          open /dev/velhpdrv read-write
-//   version                       the version request
-//   table [CAPACITY]              the size request, then the table request with a buffer of
-//                                 CAPACITY bytes (the size the driver gave, when not given)
-//   blink SLOT STATE              the blink request
-//   ioctl REQUEST                 an ioctl with another request code
-//   qm NAME|- WHICH SIZE          query_module through the symbol that the process has
-//   uname                         the kernel release
+// velhsim_probe REQUEST [ARG...]: makes the calls of the library's Linux layer for real, so that
+// the simulator's tests see what a command under velhsim meets (sim/tests/transcripts): open,
+// version, table [CAPACITY], blink SLOT STATE and ioctl REQUEST on the slot driver's device;
+// qm NAME|- WHICH SIZE (query_module); uname. Errors print as "error NAME" with errno's name.
 #include <dlfcn.h>
 #include <fcntl.h>
 #include <sys/ioctl.h>
@@ -34,52 +26,24 @@ int Error() {
     return 1;
 }
 
-// One request on the open device, saying `done` when it succeeds.
-int Request(const UniqueFd& fd, unsigned long request, void* argument, const char* done) {
+// One request on the device, saying `done` when it succeeds.
+bool Request(const UniqueFd& fd, unsigned long request, void* argument, const char* done) {
     if (!fd || ioctl(fd.Get(), request, argument) != 0) {
-        return Error();
+        return Error() == 0;
     }
-    std::printf("%s", done);
-    return 0;
-}
-
-uint32_t Number(const char* text) {
-    return static_cast<uint32_t>(std::strtoul(text, nullptr, 0));
-}
-
-int Table(int fd, const char* capacity) {
-    _VELH_TABLE_XFER transfer{};
-    if (ioctl(fd, VELH_IOCTL_TABLE_SIZE, &transfer) != 0) {
-        return Error();
-    }
-    std::printf("size %u\n", transfer.Size);
-    transfer.Size = capacity != nullptr ? Number(capacity) : transfer.Size;
-    std::vector<unsigned char> buffer(transfer.Size + 1, 0xEE);
-    transfer.Buffer = buffer.data();
-    if (ioctl(fd, VELH_IOCTL_TABLE, &transfer) != 0) {
-        return Error();
-    }
-    std::printf("table %u ", transfer.Size);
-    for (uint32_t i = 0; i < transfer.Size; ++i) {
-        std::printf("%02x", buffer[i]);
-    }
-    // The byte after the table shows whether the driver wrote past it.
-    std::printf(" next %02x\n", buffer[transfer.Size]);
-    return 0;
+    return std::printf("%s", done) >= 0;
 }
 
 int QueryModule(const char* name, int which, size_t capacity) {
     using QueryModuleFunction = int (*)(const char*, int, void*, size_t, size_t*);
     const auto query = reinterpret_cast<QueryModuleFunction>(dlsym(RTLD_DEFAULT, "query_module"));
-    if (query == nullptr) {
-        std::printf("no query_module\n");
-        return 1;
-    }
     std::vector<unsigned long> words(capacity / sizeof(unsigned long) + 1);
     char* buffer = capacity != 0 ? reinterpret_cast<char*>(words.data()) : nullptr;
     size_t ret = 0;
-    const int result =
-        query(std::strcmp(name, "-") == 0 ? nullptr : name, which, buffer, capacity, &ret);
+    errno = ENOSYS;
+    const int result = query == nullptr ? -1
+                                        : query(std::strcmp(name, "-") == 0 ? nullptr : name, which,
+                                                buffer, capacity, &ret);
     const int error = errno;
     std::printf("ret %zu\n", ret);
     errno = error;
@@ -104,34 +68,52 @@ int QueryModule(const char* name, int which, size_t capacity) {
 
 int main(int argc, char** argv) {
     const std::string command = argc > 1 ? argv[1] : "";
+    const auto number = [&](int i) {
+        return i < argc ? static_cast<uint32_t>(std::strtoul(argv[i], nullptr, 0)) : 0;
+    };
     if (command == "qm" && argc == 5) {
-        return QueryModule(argv[2], static_cast<int>(Number(argv[3])), Number(argv[4]));
+        return QueryModule(argv[2], static_cast<int>(number(3)), number(4));
     }
-    if (command == "uname" && argc == 2) {
-        struct utsname name {};
+    struct utsname name {};
+    if (command == "uname") {
         return uname(&name) != 0 ? Error() : (std::printf("release %s\n", name.release), 0);
     }
     const UniqueFd fd(open(VELHPDRV_DEVICE, O_RDWR));
-    if (command == "open" && argc == 2) {
+    _VELH_VERSION version{};
+    _VELH_BLINK blink{number(2), number(3)};
+    _VELH_TABLE_XFER transfer{};
+    int other = 0;
+    if (command == "open") {
         return fd ? (std::printf("open ok\n"), 0) : Error();
     }
-    if (command == "version" && argc == 2) {
-        _VELH_VERSION version{};
-        const int failed = Request(fd, VELH_IOCTL_VERSION, &version, "version ");
-        return failed != 0
-                   ? failed
-                   : (std::printf("%d.%d.%d\n", version.Major, version.Minor, version.Patch), 0);
+    if (command == "version") {
+        return Request(fd, VELH_IOCTL_VERSION, &version, "version ")
+                   ? (std::printf("%d.%d.%d\n", version.Major, version.Minor, version.Patch), 0)
+                   : 1;
     }
-    if (command == "table" && (argc == 2 || argc == 3)) {
-        return fd ? Table(fd.Get(), argc == 3 ? argv[2] : nullptr) : Error();
+    if (command == "table") {
+        if (!Request(fd, VELH_IOCTL_TABLE_SIZE, &transfer, "size ")) {
+            return 1;
+        }
+        std::printf("%u\n", transfer.Size);
+        // One byte more than the driver is told, which shows whether it wrote past the table.
+        std::vector<unsigned char> buffer((argc > 2 ? number(2) : transfer.Size) + 1, 0xEE);
+        transfer.Size = static_cast<uint32_t>(buffer.size() - 1);
+        transfer.Buffer = buffer.data();
+        if (!Request(fd, VELH_IOCTL_TABLE, &transfer, "table ")) {
+            return 1;
+        }
+        std::printf("%u ", transfer.Size);
+        for (uint32_t i = 0; i <= transfer.Size; ++i) {
+            std::printf(i < transfer.Size ? "%02x" : " next %02x\n", buffer[i]);
+        }
+        return 0;
     }
-    if (command == "blink" && argc == 4) {
-        _VELH_BLINK blink{Number(argv[2]), Number(argv[3])};
-        return Request(fd, VELH_IOCTL_BLINK, &blink, "blink ok\n");
+    if (command == "blink") {
+        return Request(fd, VELH_IOCTL_BLINK, &blink, "blink ok\n") ? 0 : 1;
     }
-    if (command == "ioctl" && argc == 3) {
-        int other = 0;
-        return Request(fd, Number(argv[2]), &other, "ioctl ok\n");
+    if (command == "ioctl") {
+        return Request(fd, number(2), &other, "ioctl ok\n") ? 0 : 1;
     }
     std::fprintf(stderr, "velhsim_probe: unknown request\n");
     return 2;
