@@ -54,20 +54,16 @@ TEST(DescriptorSize, SizesByTypeWithBitSevenForcedAndNeverReadsPastTheAvailableB
     InstallTree tree;
     // Bytes, available, size. 0x20 with bit 7 forced reads as the end marker.
     const uint32_t past = ASL_SIZE_PAST_END;
-    const std::tuple<std::vector<uint8_t>, uint32_t, uint32_t> cases[] = {
-        {{0x81, 20, 0}, 3, 20},
-        {{0x02, 16}, 2, 16},
-        {{'V', 'H', 'S', 'L', 16}, 5, 16},
-        {{0x91, 4, 'a', 'b', 'c', 0, 0x55}, 7, 6},
-        {{0x91, 4, 'a', 'b', 'c', 0}, 6, 6},
-        {{0x11, 4, 0}, 3, 3},
-        {{0xA0}, 1, 1},
-        {{0x20}, 1, 1},
-        {{0x91, 4, 'a', 'b', 'c', 0}, 5, past},
-        {{0x91, 4, 'a', 'b', 'c', 0}, 2, past},
-        {{0x81, 16}, 1, past},
-        {{0x81, 16}, 0, past},
-        {{'V', 'H', 'S', 'L', 16}, 4, past}};
+    using Bytes = std::vector<uint8_t>;
+    using Case = std::tuple<Bytes, uint32_t, uint32_t>;
+    const Bytes string{0x91, 4, 'a', 'b', 'c', 0}, header{'V', 'H', 'S', 'L', 16};
+    const Case cases[] = {Case({0x81, 20, 0}, 3, 20), Case({0x02, 16}, 2, 16),
+                          Case(header, 5, 16),        Case({0x91, 4, 'a', 'b', 'c', 0, 0x55}, 7, 6),
+                          Case(string, 6, 6),         Case({0x11, 4, 0}, 3, 3),
+                          Case({0xA0}, 1, 1),         Case({0x20}, 1, 1),
+                          Case(string, 5, past),      Case(string, 2, past),
+                          Case({0x81, 16}, 1, past),  Case({0x81, 16}, 0, past),
+                          Case(header, 4, past)};
     for (const auto& [bytes, available, size] : cases) {
         EXPECT_EQ(DescriptorSize(bytes.data(), available), size) << int(bytes[0]) << available;
     }
@@ -152,9 +148,10 @@ TEST(WalkAslPacket, NeverWalksPastThePacketBuffer) {
     Recorder recorder(packet.Bytes.data());
     recorder.Walk(packet.Bytes.data(), 200000);
     EXPECT_EQ(recorder.Fields.size(), (ASL_PACKET_CAPACITY - 32) / 16);
-    EXPECT_NE(tree.Log().find("Descriptor type 0x81 at offset 80000 runs past the 80016 bytes "
-                              "of the packet\n"),
-              std::string::npos);
+    EXPECT_TRUE(
+        tree.Logged("Descriptor type 0x81 at offset 80000 runs past the 80016 bytes "
+                    "of the packet\n"))
+        << tree.Log();
     EXPECT_EQ(recorder.Trace.substr(recorder.Trace.size() - 9), "malformed");
 
     // Without the last one the buffer is full of descriptors and has no end marker.
@@ -163,16 +160,14 @@ TEST(WalkAslPacket, NeverWalksPastThePacketBuffer) {
     Recorder full(packet.Bytes.data());
     full.Walk(packet.Bytes.data(), 80017);
     EXPECT_EQ(full.Fields.size(), (ASL_PACKET_CAPACITY - 16) / 16);
-    EXPECT_NE(tree.Log().find("No end marker within the 80016 bytes of the packet\n"),
-              std::string::npos);
+    EXPECT_TRUE(tree.Logged("No end marker within the 80016 bytes of the packet\n")) << tree.Log();
     EXPECT_EQ(full.Trace.substr(full.Trace.size() - 9), "malformed");
 }
 
+// A wrong signature is aslstore_test's; here the signature must lie within the delivered bytes.
 TEST(IsAslPacket, ChecksTheSignatureWithinTheDeliveredBytes) {
-    auto packet = AslBuilder().Header().End().Packet();
-    EXPECT_TRUE(IsAslPacket(packet.get(), 17));
+    const auto packet = AslBuilder().Header().End().Packet();
+    EXPECT_TRUE(IsAslPacket(packet.get(), 4));
     EXPECT_FALSE(IsAslPacket(packet.get(), 3));
     EXPECT_FALSE(IsAslPacket(nullptr, 17));
-    packet->Header.Signature[3] = 'X';
-    EXPECT_FALSE(IsAslPacket(packet.get(), 17));
 }

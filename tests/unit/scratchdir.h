@@ -79,6 +79,7 @@ class InstallTree {
     const ScratchDir& Scratch() const { return Dir; }
     std::string InstFile(const std::string& name) const { return Dir.Path("inst/" + name); }
     std::string Log() const { return Dir.Read("log/velhslot.slotmgr.hwinfo.log"); }
+    bool Logged(const std::string& text) const { return Log().find(text) != std::string::npos; }
 
   private:
     ScratchDir Dir;
