@@ -26,69 +26,50 @@ struct AslSlotSpec {
 
 class AslBuilder {
   public:
-    AslBuilder& Header(const char* machine = "TST001") {
-        Bytes.insert(Bytes.end(), {'V', 'H', 'S', 'L', 16, 1, 0});
-        for (int i = 0; i < 6; ++i) {
-            Bytes.push_back(static_cast<uint8_t>(machine[i]));
-        }
-        Bytes.insert(Bytes.end(), {0, 0, 0});
+    // Revision 1.0; the machine's name is cut or padded with zeros to its six bytes.
+    AslBuilder& Header(const std::string& machine = "TST001") {
+        std::string id = machine.substr(0, 6);
+        id.resize(9, '\0');  // and three reserved bytes
+        Raw({'V', 'H', 'S', 'L', 16, 1, 0});
+        Bytes.insert(Bytes.end(), id.begin(), id.end());
         return *this;
     }
-
     AslBuilder& Bus(const AslBusSpec& b) {
         return Fixed({BUS_TYPE, 16, b.BusID, b.ChassisID, b.DrawerID, b.BusNumber, 0, 0, b.Speed,
                       b.At33, b.At66, b.AtX66, b.AtX100, b.AtX133});
     }
-
     AslBuilder& Slot(const AslSlotSpec& s) {
         return Fixed({SLOT_TYPE, 16, static_cast<uint8_t>(s.SlotID & 0xFF),
                       static_cast<uint8_t>(s.SlotID >> 8), s.BusID, s.DeviceNum, s.Sun, s.Attrib1,
                       s.Attrib2, s.AttnReason, s.Status, s.LedStatus, s.SlotUiNumber});
     }
-
-    AslBuilder& Chassis(uint8_t chassisId, uint8_t stringId) {
-        return Fixed({CHASSIS_TYPE, 16, chassisId, 0, stringId});
-    }
-
-    AslBuilder& Drawer(uint8_t drawerId, uint8_t stringId) {
-        return Fixed({DRAWER_TYPE, 16, drawerId, 0, stringId});
-    }
-
+    AslBuilder& Chassis(uint8_t id, uint8_t name) { return Fixed({CHASSIS_TYPE, 16, id, 0, name}); }
+    AslBuilder& Drawer(uint8_t id, uint8_t name) { return Fixed({DRAWER_TYPE, 16, id, 0, name}); }
     AslBuilder& String(uint8_t number, const std::string& text) {
-        Last = Bytes.size();
-        Bytes.push_back(STRING_TYPE);
-        Bytes.push_back(number);
-        Bytes.insert(Bytes.end(), text.begin(), text.end());
-        Bytes.push_back(0);
+        Raw({STRING_TYPE, number});
+        Bytes.insert(Bytes.end(), text.c_str(), text.c_str() + text.size() + 1);
         return *this;
     }
-
     AslBuilder& End() { return Raw({END_TYPE}); }
-
     AslBuilder& Raw(std::initializer_list<uint8_t> bytes) {
         Last = Bytes.size();
         Bytes.insert(Bytes.end(), bytes);
         return *this;
     }
-
     // Clears bit 7 of the last descriptor's type byte: walked over, not stored.
     AslBuilder& Invalid() {
         Bytes[Last] &= 0x7F;
         return *this;
     }
-
     // Sets the Length byte of the last fixed descriptor.
     AslBuilder& Length(uint8_t length) {
         Bytes[Last + 1] = length;
         return *this;
     }
-
     size_t Size() const { return Bytes.size(); }
-
     // The packet in a zero-filled buffer of the full capacity, as the acquisition holds it.
     std::unique_ptr<_ASL_PACKET> Packet() const {
         auto packet = std::make_unique<_ASL_PACKET>();
-        std::memset(packet.get(), 0, sizeof(_ASL_PACKET));
         std::memcpy(packet.get(), Bytes.data(), std::min(Bytes.size(), sizeof(_ASL_PACKET)));
         return packet;
     }
@@ -96,11 +77,10 @@ class AslBuilder {
     std::vector<uint8_t> Bytes;
 
   private:
+    // A fixed descriptor: its fields, zero up to its 16 bytes.
     AslBuilder& Fixed(std::initializer_list<uint8_t> fields) {
-        Last = Bytes.size();
-        std::vector<uint8_t> descriptor(fields);
-        descriptor.resize(16, 0);
-        Bytes.insert(Bytes.end(), descriptor.begin(), descriptor.end());
+        Raw(fields);
+        Bytes.resize(Last + 16, 0);
         return *this;
     }
 

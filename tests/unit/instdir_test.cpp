@@ -2,8 +2,9 @@
 
 #include <unistd.h>
 
-#include <cstdlib>
 #include <cwchar>
+#include <filesystem>
+#include <fstream>
 #include <string>
 #include <vector>
 
@@ -15,11 +16,6 @@
 
 namespace {
 
-std::string Cwd() {
-    UniqueMalloc<char> cwd(getcwd(nullptr, 0));
-    return cwd != nullptr ? cwd.get() : "";
-}
-
 std::string Path(const char* name) {
     UniqueMalloc<char> path(InstallDirFile(name));
     return path != nullptr ? path.get() : "(null)";
@@ -27,52 +23,43 @@ std::string Path(const char* name) {
 
 }  // namespace
 
-TEST(InstallDir, IsTheWorkingDirectory) {
+TEST(InstallDir, IsTheWorkingDirectoryAndHoldsEveryName) {
     InstallTree tree;
-    const std::string cwd = Cwd();
+    const std::string cwd = std::filesystem::current_path();
     std::vector<wchar_t> buffer(cwd.size() + 1, L'?');
     ASSERT_TRUE(GetInstallDir(buffer.data(), static_cast<int32_t>(buffer.size())));
     EXPECT_EQ(std::wstring(buffer.data()), std::wstring(cwd.begin(), cwd.end()));
-
     EXPECT_FALSE(GetInstallDir(buffer.data(), static_cast<int32_t>(cwd.size())));
     EXPECT_FALSE(GetInstallDir(buffer.data(), 0));
     EXPECT_FALSE(GetInstallDir(nullptr, 100));
-    EXPECT_EQ(tree.Log(),
-              "\nVELHLIB, GetInstallDir:  Insufficient buffer for install path\n"
-              "\nVELHLIB, GetInstallDir:  Insufficient buffer for install path\n"
-              "\nVELHLIB, GetInstallDir:  Called with a NULL buffer\n");
-}
+    const std::string insufficient =
+        "\nVELHLIB, GetInstallDir:  Insufficient buffer for install path\n";
+    EXPECT_EQ(tree.Log(), insufficient + insufficient +
+                              "\nVELHLIB, GetInstallDir:  Called with a NULL buffer\n");
 
-TEST(InstallDirFile, PlacesEveryNameInsideTheInstallDirectory) {
-    InstallTree tree;
-    const std::string cwd = Cwd();
     EXPECT_EQ(Path("dbgprint"), cwd + "/dbgprint");
     EXPECT_EQ(Path("/x.pci"), cwd + "/x.pci");
     EXPECT_EQ(Path(""), cwd);
     EXPECT_EQ(Path(nullptr), cwd);
-
     EXPECT_FALSE(Exist(Path("velhadp.crd").c_str()));
     tree.Scratch().Write("inst/velhadp.crd", "x");
     EXPECT_TRUE(Exist(Path("velhadp.crd").c_str()));
     EXPECT_FALSE(Exist(nullptr));
-    EXPECT_EQ(tree.Log(), "");
 }
 
-TEST(InstallDirFile, NoneWhenTheWorkingDirectoryIsGone) {
+// A working directory that is gone, or of more than 4096 characters: nothing in it can be
+// named, so the level file there is not read, and the log beside it says why.
+TEST(InstallDirFile, NoneWhenTheWorkingDirectoryIsGoneOrBeyondTheBuffer) {
     ScratchDir dir;
-    ASSERT_EQ(mkdir(dir.Path("gone").c_str(), 0700), 0);
-    WorkingDir cwd(dir.Path("gone"));
+    WorkingDir cwd(dir.Path());
+    ASSERT_EQ(mkdir("gone", 0700), 0);
+    ASSERT_EQ(chdir("gone"), 0);
     ASSERT_EQ(rmdir(dir.Path("gone").c_str()), 0);
     wchar_t buffer[INSTALL_DIR_CHARS];
     EXPECT_FALSE(GetInstallDir(buffer, INSTALL_DIR_CHARS));
     EXPECT_EQ(InstallDirFile("dbgprint"), nullptr);
-}
 
-// A working directory of more than 4096 characters: nothing in it can be named, so the level
-// file there is not read, and the log beside it says why.
-TEST(InstallDirFile, NoneForAWorkingDirectoryBeyondTheBuffer) {
-    ScratchDir dir;
-    WorkingDir cwd(dir.Path());
+    ASSERT_EQ(chdir(dir.Path().c_str()), 0);
     const std::string component(200, 'd');
     const int levels = 21;
     for (int i = 0; i < levels; i++) {
@@ -82,34 +69,18 @@ TEST(InstallDirFile, NoneForAWorkingDirectoryBeyondTheBuffer) {
     ASSERT_EQ(mkdir("log", 0700), 0);
     ASSERT_EQ(mkdir("inst", 0700), 0);
     ASSERT_EQ(chdir("inst"), 0);
-    ASSERT_GE(Cwd().size(), static_cast<size_t>(INSTALL_DIR_CHARS));
-    {
-        UniqueFile level(std::fopen("dbgprint", "w"));
-        ASSERT_NE(level, nullptr);
-        std::fputs("hwdbgprint 0x10\n", level.get());
-    }
-
+    ASSERT_GE(std::filesystem::current_path().string().size(), size_t{INSTALL_DIR_CHARS});
+    std::ofstream("dbgprint") << "hwdbgprint 0x10\n";
     GetDebugPrintLevel(0);
     EXPECT_EQ(HwInfoPrintLevel, 0u);
     EXPECT_EQ(InstallDirFile("dbgprint"), nullptr);
-    std::string log;
-    {
-        UniqueFile file(std::fopen("../log/velhslot.slotmgr.hwinfo.log", "r"));
-        ASSERT_NE(file, nullptr);
-        char chunk[256];
-        while (std::fgets(chunk, sizeof(chunk), file.get()) != nullptr) {
-            log += chunk;
-        }
-    }
     const std::string line = "\nVELHLIB, GetInstallDir:  Insufficient buffer for install path\n";
-    EXPECT_EQ(log, line + line);
+    EXPECT_EQ(ReadAll("../log/velhslot.slotmgr.hwinfo.log"), line + line);
 
     // The tree is too deep for the scratch folder's own removal: take it down level by level.
-    ASSERT_EQ(unlink("dbgprint"), 0);
     ASSERT_EQ(chdir(".."), 0);
-    ASSERT_EQ(rmdir("inst"), 0);
-    ASSERT_EQ(unlink("log/velhslot.slotmgr.hwinfo.log"), 0);
-    ASSERT_EQ(rmdir("log"), 0);
+    std::filesystem::remove_all("inst");
+    std::filesystem::remove_all("log");
     for (int i = 0; i < levels; i++) {
         ASSERT_EQ(chdir(".."), 0);
         ASSERT_EQ(rmdir(component.c_str()), 0);

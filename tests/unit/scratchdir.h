@@ -1,17 +1,23 @@
-// A temporary folder for tests that touch the file system, removed with its contents, and a
-// guard that runs a test inside a folder and returns to the previous one.
+// A temporary folder for tests that touch the file system, removed with its contents; a guard
+// that runs a test inside a folder; the install tree the library writes its log beside.
 #pragma once
 
-#include <ftw.h>
 #include <stdlib.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
-#include <cstdio>
+#include <filesystem>
 #include <fstream>
-#include <iterator>
+#include <sstream>
 #include <stdexcept>
 #include <string>
+
+// The whole file, or "" when it cannot be read.
+inline std::string ReadAll(const std::string& path) {
+    std::ostringstream text;
+    text << std::ifstream(path, std::ios::binary).rdbuf();
+    return text.str();
+}
 
 class ScratchDir {
   public:
@@ -23,27 +29,20 @@ class ScratchDir {
         Root = pattern;
     }
     ~ScratchDir() {
-        nftw(
-            Root.c_str(),
-            [](const char* path, const struct stat*, int, struct FTW*) { return remove(path); }, 16,
-            FTW_DEPTH | FTW_PHYS);
+        std::error_code ignored;
+        std::filesystem::remove_all(Root, ignored);
     }
     ScratchDir(const ScratchDir&) = delete;
     ScratchDir& operator=(const ScratchDir&) = delete;
 
     const std::string& Path() const { return Root; }
     std::string Path(const std::string& relative) const { return Root + "/" + relative; }
-
     // Writes a file (binary), creating nothing but the file itself.
     std::string Write(const std::string& relative, const std::string& content) const {
-        std::string path = Path(relative);
-        std::ofstream(path, std::ios::binary) << content;
-        return path;
+        std::ofstream(Path(relative), std::ios::binary) << content;
+        return Path(relative);
     }
-    std::string Read(const std::string& relative) const {
-        std::ifstream in(Path(relative), std::ios::binary);
-        return std::string((std::istreambuf_iterator<char>(in)), std::istreambuf_iterator<char>());
-    }
+    std::string Read(const std::string& relative) const { return ReadAll(Path(relative)); }
 
   private:
     std::string Root;
@@ -51,56 +50,40 @@ class ScratchDir {
 
 // A file of tests/unit/data: expected logs too long to read well inline.
 inline std::string TestData(const std::string& name) {
-    std::ifstream in(std::string(VELH_TEST_DATA) + "/" + name, std::ios::binary);
-    if (!in) {
+    const std::string path = std::string(VELH_TEST_DATA) + "/" + name;
+    if (!std::filesystem::exists(path)) {
         throw std::runtime_error("no test data " + name);
     }
-    return std::string((std::istreambuf_iterator<char>(in)), std::istreambuf_iterator<char>());
+    return ReadAll(path);
 }
 
 // Makes directory the working directory for the guard's lifetime.
 class WorkingDir {
   public:
-    explicit WorkingDir(const std::string& directory) {
-        char* previous = getcwd(nullptr, 0);
-        if (previous == nullptr || chdir(directory.c_str()) != 0) {
-            free(previous);
-            throw std::runtime_error("cannot enter " + directory);
-        }
-        Previous = previous;
-        free(previous);
+    explicit WorkingDir(const std::string& directory) : Previous(std::filesystem::current_path()) {
+        std::filesystem::current_path(directory);
     }
     ~WorkingDir() {
-        if (chdir(Previous.c_str()) != 0) {
-            perror("chdir back");
-        }
+        std::error_code ignored;
+        std::filesystem::current_path(Previous, ignored);
     }
-    WorkingDir(const WorkingDir&) = delete;
-    WorkingDir& operator=(const WorkingDir&) = delete;
 
   private:
-    std::string Previous;
+    std::filesystem::path Previous;
 };
 
 // An install directory "inst" with the hardware-information log's folder "log" beside it, made
 // the working directory for the guard's lifetime.
 class InstallTree {
   public:
-    InstallTree() : Inst(MakeDirs(Dir)), Cwd(Inst) {}
     const ScratchDir& Scratch() const { return Dir; }
     std::string InstFile(const std::string& name) const { return Dir.Path("inst/" + name); }
     std::string Log() const { return Dir.Read("log/velhslot.slotmgr.hwinfo.log"); }
+    bool Logged(const std::string& text) const { return Log().find(text) != std::string::npos; }
 
   private:
-    static std::string MakeDirs(const ScratchDir& dir) {
-        if (mkdir(dir.Path("inst").c_str(), 0700) != 0 ||
-            mkdir(dir.Path("log").c_str(), 0700) != 0) {
-            throw std::runtime_error("cannot make the install tree");
-        }
-        return dir.Path("inst");
-    }
-
     ScratchDir Dir;
-    std::string Inst;
-    WorkingDir Cwd;
+    bool Made = std::filesystem::create_directory(Dir.Path("inst")) &&
+                std::filesystem::create_directory(Dir.Path("log"));
+    WorkingDir Cwd{Dir.Path("inst")};
 };

@@ -87,8 +87,7 @@ TEST_F(VpdTest, AFoundRecordStaysWhenALaterSearchFails) {
     EXPECT_FALSE(GetVPD(&Vpd));
     EXPECT_TRUE(ValidVPD);
     EXPECT_EQ(std::memcmp(&Vpd, &record, sizeof(Vpd)), 0);
-    EXPECT_NE(Tree.Log().find("GetVPD():  error opening memory file " + SysPaths().DevMem),
-              std::string::npos)
+    EXPECT_TRUE(Tree.Logged("GetVPD():  error opening memory file " + SysPaths().DevMem))
         << Tree.Log();
 
     // A short image is a read failure.
@@ -99,8 +98,7 @@ TEST_F(VpdTest, AFoundRecordStaysWhenALaterSearchFails) {
     _VPD_LAYOUT out;
     EXPECT_FALSE(GetVPD(&out));
     EXPECT_FALSE(ValidVPD);
-    EXPECT_NE(Tree.Log().find("GetVPD():  read failed, got 100 bytes"), std::string::npos)
-        << Tree.Log();
+    EXPECT_TRUE(Tree.Logged("GetVPD():  read failed, got 100 bytes")) << Tree.Log();
 }
 
 }  // namespace
