@@ -10,7 +10,6 @@ import java.nio.charset.StandardCharsets;
 import java.nio.file.*;
 import java.util.*;
 import java.util.concurrent.TimeUnit;
-import java.util.regex.Pattern;
 import java.util.stream.Collectors;
 
 /**
@@ -20,17 +19,12 @@ import java.util.stream.Collectors;
  * JVM is that 32-bit one under qemu-i386, the simulator that of the build velh.sim.build.dir.
  */
 final class AgentHarness {
-    interface Edit {
-        void apply(Path machine) throws IOException;
-    }
-
+    private static final String I386_JAVA = System.getProperty("velh.i386.java", "");
     private final Path base;
-    private String i386Java = System.getProperty("velh.i386.java", "");
-    private Path libraryDir = Path.of(property("velh.build.dir"));
     private boolean jniLog;
     private Path machine;
+    private String edit = "";
     private final Map<String, String> environment = new HashMap<>();
-    private final List<Edit> edits = new ArrayList<>();
 
     AgentHarness(Path base) { this.base = base; }
 
@@ -38,9 +32,7 @@ final class AgentHarness {
 
     static Path sample(String name) { return Path.of(property("velh.machines.dir"), name); }
 
-    static int occurrences(String text, String part) {
-        return text.split(Pattern.quote(part), -1).length - 1;
-    }
+    static Path data(String name) { return Path.of(property("velh.data.dir"), name); }
 
     static JsonObject json(String text) { return JsonParser.parseString(text).getAsJsonObject(); }
 
@@ -52,39 +44,20 @@ final class AgentHarness {
     /** Equal to the file, or with VELH_GOLDEN_UPDATE=1 written to it instead, for review. */
     static void assertGolden(Path expected, String actual) throws IOException {
         if ("1".equals(System.getenv("VELH_GOLDEN_UPDATE"))) {
+            Files.createDirectories(expected.getParent());
             Files.writeString(expected, actual);
         }
         assertEquals(Objects.requireNonNullElse(read(expected), "(missing)"), actual,
             expected::toString);
     }
 
-    /** The systems, busses and slots of data/NAME, field by field, but for the ignored ones. */
-    static void assertTopology(String name, JsonObject document, String... ignored)
-        throws IOException {
-        JsonObject expected = json(Files.readString(Path.of(property("velh.data.dir"), name)));
-        for (String kind : List.of("systems", "busses", "slots")) {
-            JsonArray want = expected.getAsJsonArray(kind);
-            JsonArray got = document.getAsJsonArray(kind).deepCopy();
-            for (JsonArray array : List.of(want, got)) {
-                array.forEach(element -> List.of(ignored).forEach(element.getAsJsonObject()::remove));
-            }
-            assertEquals(want, got, kind);
-        }
-    }
-
     /** Creates an empty "../log/jni.log", which switches the JNI-side log on. */
     AgentHarness withJniLog() { jniLog = true; return this; }
 
-    /** The 64-bit JVM and library of velh.sim.build.dir. */
-    AgentHarness on64Bit() {
-        i386Java = "";
-        libraryDir = Path.of(property("velh.sim.build.dir"));
-        return this;
-    }
-
     AgentHarness onMachine(Path folder) { machine = folder; return this; }
 
-    AgentHarness edit(Edit edit) { edits.add(edit); return this; }
+    /** A shell command run in the machine's copy; $SAMPLES is the folder of the samples. */
+    AgentHarness edit(String command) { edit = command; return this; }
 
     AgentHarness env(String name, String value) { environment.put(name, value); return this; }
 
@@ -107,15 +80,16 @@ final class AgentHarness {
             Path run = root.resolve("run");
             Path logDir = run.resolve("log");
             List<String> command = new ArrayList<>();
-            boolean i386 = !i386Java.isEmpty();
+            boolean i386 = !I386_JAVA.isEmpty();
             if (machine != null) {
                 Path copy = root.resolve("machine");
                 copyTree(machine, copy);
-                for (Edit edit : edits) {
-                    edit.apply(copy);
-                }
+                ProcessBuilder shell = new ProcessBuilder("sh", "-ec", edit).inheritIO()
+                    .directory(copy.toFile());
+                shell.environment().put("SAMPLES", property("velh.machines.dir"));
+                assertEquals(0, shell.start().waitFor(), edit);
                 logDir = copy.resolve("log");
-                String sim = System.getProperty("velh.sim.build.dir", libraryDir.toString());
+                String sim = System.getProperty("velh.sim.build.dir", property("velh.build.dir"));
                 command.addAll(List.of(sim + "/sim/velhsim", "--machine", copy.toString(),
                     "--run-dir", run.toString(), i386 ? "--i386" : "--"));
                 command.addAll(i386 ? List.of("--") : List.of());
@@ -128,11 +102,11 @@ final class AgentHarness {
             if (jniLog) {
                 Files.createFile(logDir.resolve("jni.log"));
             }
-            command.add(i386 ? i386Java : System.getProperty("java.home") + "/bin/java");
+            command.add(i386 ? I386_JAVA : System.getProperty("java.home") + "/bin/java");
             // Under qemu only the interpreter: the JIT's code patching across threads now and
             // then trips the JVM's own checks.
             command.addAll(i386 ? List.of("-Xcheck:jni", "-Xint") : List.of("-Xcheck:jni"));
-            command.addAll(List.of("-Djava.library.path=" + libraryDir, "-cp",
+            command.addAll(List.of("-Djava.library.path=" + property("velh.build.dir"), "-cp",
                 property("velh.agent.jar") + File.pathSeparator + property("velh.test.jar"),
                 mainClass));
             command.addAll(List.of(args));
@@ -177,10 +151,6 @@ final class AgentHarness {
         String jniLog() { return read(runDir.resolve("log/jni.log")); }
 
         String hwLog() { return read(runDir.resolve("log/velhslot.slotmgr.hwinfo.log")); }
-
-        JsonObject document() { return json(stdout); }
-
-        List<String> driverRequests() { return lines(runDir.resolve("driver/requests.log")); }
 
         /** The runs of a stand-in, which may end after the JVM: waits for atLeast, then 0.3 s. */
         List<String> calls(String program, int atLeast) throws InterruptedException {

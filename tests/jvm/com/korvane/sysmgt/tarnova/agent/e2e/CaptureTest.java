@@ -30,7 +30,7 @@ class CaptureTest {
     private JsonObject json(Path machine) {
         AgentHarness.Result result = new AgentHarness(temp).onMachine(machine).agent("--json");
         assertEquals(0, result.exitCode(), result::toString);
-        return result.document();
+        return AgentHarness.json(result.stdout());
     }
 
     @Test

@@ -25,7 +25,7 @@ class DumpGoldenTest {
     void eachDumpLogsAsExpected(String name, String level) throws Exception {
         AgentHarness.Result result = new AgentHarness(temp)
             .onMachine(AgentHarness.sample("chassis-drawer"))
-            .edit(copy -> Files.writeString(copy.resolve("install/dbgprint"), "hwdbgprint " + level + "\n"))
+            .edit("echo 'hwdbgprint " + level + "' >install/dbgprint")
             .scenario("hwinfo", "exit");
         assertEquals(0, result.exitCode(), result::toString);
         // A level under which nothing is written leaves no log at all.
