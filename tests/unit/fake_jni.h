@@ -10,9 +10,6 @@
 #include <vector>
 
 struct FakeObject {
-    enum class Kind { Class, LongArray, ObjectArray, String };
-    Kind kind = Kind::Class;
-    std::string className;
     std::vector<jlong> longs;
     std::vector<FakeObject*> elements;
     std::u16string text;
@@ -20,8 +17,10 @@ struct FakeObject {
 
 class FakeJni {
   public:
+    enum Call { FindClass, NewLongArray, NewObjectArray, NewString, NewStringUTF, Other };
+
     FakeJni();
-    ~FakeJni();
+    ~FakeJni() { current = previous; }
     FakeJni(const FakeJni&) = delete;
     FakeJni& operator=(const FakeJni&) = delete;
 
@@ -30,13 +29,8 @@ class FakeJni {
         return reinterpret_cast<FakeObject*>(reference);
     }
 
-    // The nth call (counting from 1) of a function fails; 0: none does.
-    int FailNewLongArray = 0;
-    int FailNewObjectArray = 0;
-    int FailNewString = 0;
-    int FailNewStringUTF = 0;
-    int FailFindClass = 0;
-
+    // The nth call (counting from 1) of the function fails; 0: none does.
+    int FailAt[Other + 1]{};
     bool ExceptionPending = false;
     // Calls other than DeleteLocalRef made while an exception was pending.
     int CallsWithException = 0;
@@ -51,11 +45,10 @@ class FakeJni {
     JNINativeInterface_ table{};
     JNIEnv env{};
     std::vector<std::unique_ptr<FakeObject>> heap;
-    // FindClass, NewLongArray, NewObjectArray, NewString, NewStringUTF, GetObjectClass
-    int calls[6]{};
+    int calls[Other + 1]{};
 
     // Counts a call; null for the call chosen to fail, else a new local reference.
-    static FakeObject* New(int which, int failAt, FakeObject::Kind kind);
+    static FakeObject* New(Call which);
     // Stores outside the array raise the exception a JVM raises.
     static bool InBounds(jsize start, jsize length, size_t size);
 };
