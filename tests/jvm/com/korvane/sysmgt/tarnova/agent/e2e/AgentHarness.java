@@ -2,7 +2,6 @@ package com.korvane.sysmgt.tarnova.agent.e2e;
 
 import static org.junit.jupiter.api.Assertions.*;
 
-import com.google.gson.*;
 import java.io.File;
 import java.io.IOException;
 import java.io.UncheckedIOException;
@@ -10,7 +9,6 @@ import java.nio.charset.StandardCharsets;
 import java.nio.file.*;
 import java.util.*;
 import java.util.concurrent.TimeUnit;
-import java.util.stream.Collectors;
 
 /**
  * Runs a main class in a fresh JVM that loads the JNI library: in ROOT/run (install/, log/), with
@@ -34,8 +32,6 @@ final class AgentHarness {
 
     static Path data(String name) { return Path.of(property("velh.data.dir"), name); }
 
-    static JsonObject json(String text) { return JsonParser.parseString(text).getAsJsonObject(); }
-
     static void copyTree(Path from, Path to) throws IOException, InterruptedException {
         assertEquals(0, new ProcessBuilder("cp", "-rT", "--preserve=mode", from.toString(),
             to.toString()).inheritIO().start().waitFor());
@@ -51,6 +47,16 @@ final class AgentHarness {
             expected::toString);
     }
 
+    /** A file's text, decoded leniently (a log is checked, not trusted), or null without one. */
+    static String read(Path file) {
+        try {
+            return Files.exists(file) ? new String(Files.readAllBytes(file), StandardCharsets.UTF_8)
+                                      : null;
+        } catch (IOException e) {
+            throw new UncheckedIOException(e);
+        }
+    }
+
     /** Creates an empty "../log/jni.log", which switches the JNI-side log on. */
     AgentHarness withJniLog() { jniLog = true; return this; }
 
@@ -61,31 +67,32 @@ final class AgentHarness {
 
     AgentHarness env(String name, String value) { environment.put(name, value); return this; }
 
-    Result scenario(String... steps) { return run(Scenario.class.getName(), steps); }
+    Result agent(String... args) { return run("com.korvane.sysmgt.tarnova.agent.TarnovaAgent", args); }
 
-    Result agent(String... args) {
-        return run("com.korvane.sysmgt.tarnova.agent.TarnovaAgent", args);
+    /** Split at spaces: the agent's arguments if the first begins with "-", else the steps. */
+    Result run(String line) {
+        String[] args = line.split(" ");
+        return line.startsWith("-") ? agent(args) : run(Scenario.class.getName(), args);
     }
 
     private Result run(String mainClass, String... args) {
         try {
             Path root = Files.createTempDirectory(base, "run");
             Path bin = Files.createDirectories(root.resolve("bin"));
-            Path calls = Files.createDirectories(root.resolve("calls"));
             for (String program : List.of("slotwatch", "killall")) {
-                Files.writeString(bin.resolve(program),
-                    "#!/bin/sh\necho \"${0##*/}${*:+ $*}\" >> '" + calls.resolve(program) + "'\n");
+                Files.writeString(bin.resolve(program), "#!/bin/sh\necho \"${0##*/}${*:+ $*}\" >> '"
+                    + root.resolve("calls-" + program) + "'\n");
                 bin.resolve(program).toFile().setExecutable(true);
             }
             Path run = root.resolve("run");
             Path logDir = run.resolve("log");
-            List<String> command = new ArrayList<>();
             boolean i386 = !I386_JAVA.isEmpty();
+            List<String> command = new ArrayList<>();
             if (machine != null) {
                 Path copy = root.resolve("machine");
                 copyTree(machine, copy);
-                ProcessBuilder shell = new ProcessBuilder("sh", "-ec", edit).inheritIO()
-                    .directory(copy.toFile());
+                ProcessBuilder shell =
+                    new ProcessBuilder("sh", "-ec", edit).inheritIO().directory(copy.toFile());
                 shell.environment().put("SAMPLES", property("velh.machines.dir"));
                 assertEquals(0, shell.start().waitFor(), edit);
                 logDir = copy.resolve("log");
@@ -116,9 +123,8 @@ final class AgentHarness {
                 .redirectInput(new File("/dev/null"))
                 // Under the simulator the install directory exists only once the launcher made it.
                 .directory(machine != null ? root.toFile() : run.resolve("install").toFile());
-            Map<String, String> env = builder.environment();
-            env.put("PATH", bin + File.pathSeparator + env.getOrDefault("PATH", "/usr/bin:/bin"));
-            env.putAll(environment);
+            builder.environment().merge("PATH", bin.toString(), (path, ours) -> ours + ":" + path);
+            builder.environment().putAll(environment);
             Process process = builder.start();
             if (!process.waitFor(i386 ? 300 : 60, TimeUnit.SECONDS)) {
                 process.destroyForcibly().waitFor();
@@ -131,40 +137,27 @@ final class AgentHarness {
         }
     }
 
-    /** A file's text, decoded leniently (a log is checked, not trusted), or null without one. */
-    static String read(Path file) {
-        try {
-            return Files.exists(file)
-                ? new String(Files.readAllBytes(file), StandardCharsets.UTF_8) : null;
-        } catch (IOException e) {
-            throw new UncheckedIOException(e);
-        }
-    }
-
-    private static List<String> lines(Path file) {
-        String text = read(file);
-        return text == null ? List.of() : text.lines().collect(Collectors.toList());
-    }
-
     /** What a run left behind; runDir holds install/, log/ and the machine's files. */
     record Result(Path root, Path runDir, int exitCode, String stdout, String stderr) {
-        String jniLog() { return read(runDir.resolve("log/jni.log")); }
+        String file(String path) { return read(runDir.resolve(path)); }
 
-        String hwLog() { return read(runDir.resolve("log/velhslot.slotmgr.hwinfo.log")); }
+        String jniLog() { return file("log/jni.log"); }
+
+        String hwLog() { return file("log/velhslot.slotmgr.hwinfo.log"); }
 
         /** The runs of a stand-in, which may end after the JVM: waits for atLeast, then 0.3 s. */
         List<String> calls(String program, int atLeast) throws InterruptedException {
-            Path record = root.resolve("calls").resolve(program);
-            for (int i = 0; i < 500 && lines(record).size() < atLeast; i++) {
+            Path record = root.resolve("calls-" + program);
+            for (int i = 0; i < 500 && calls(record).size() < atLeast; i++) {
                 Thread.sleep(20);
             }
             Thread.sleep(300);
-            return lines(record);
+            return calls(record);
         }
 
-        List<String> values(String key) {
-            return stdout.lines().filter(line -> line.startsWith(key + "="))
-                .map(line -> line.substring(key.length() + 1)).collect(Collectors.toList());
+        private static List<String> calls(Path record) {
+            String text = read(record);
+            return text == null ? List.of() : text.lines().toList();
         }
 
         @Override

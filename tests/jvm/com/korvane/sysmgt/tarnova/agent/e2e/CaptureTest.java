@@ -2,7 +2,6 @@ package com.korvane.sysmgt.tarnova.agent.e2e;
 
 import static org.junit.jupiter.api.Assertions.*;
 
-import com.google.gson.*;
 import java.nio.file.*;
 import java.util.*;
 import java.util.stream.Stream;
@@ -27,10 +26,11 @@ class CaptureTest {
         assertEquals(0, builder.start().waitFor(), Files.readString(out));
     }
 
-    private JsonObject json(Path machine) {
+    /** The agent's document on the machine. */
+    private String json(Path machine) {
         AgentHarness.Result result = new AgentHarness(temp).onMachine(machine).agent("--json");
         assertEquals(0, result.exitCode(), result::toString);
-        return AgentHarness.json(result.stdout());
+        return result.stdout();
     }
 
     @Test

@@ -26,7 +26,7 @@ class DumpGoldenTest {
         AgentHarness.Result result = new AgentHarness(temp)
             .onMachine(AgentHarness.sample("chassis-drawer"))
             .edit("echo 'hwdbgprint " + level + "' >install/dbgprint")
-            .scenario("hwinfo", "exit");
+            .run("hwinfo exit");
         assertEquals(0, result.exitCode(), result::toString);
         // A level under which nothing is written leaves no log at all.
         AgentHarness.assertGolden(Path.of(AgentHarness.property("velh.golden.dir"), name + ".log"),

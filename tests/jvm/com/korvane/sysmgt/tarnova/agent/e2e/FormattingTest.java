@@ -3,6 +3,7 @@ package com.korvane.sysmgt.tarnova.agent.e2e;
 import static com.korvane.sysmgt.tarnova.agent.e2e.AgentHarness.*;
 import static org.junit.jupiter.api.Assertions.*;
 
+import com.google.gson.JsonParser;
 import com.korvane.sysmgt.tarnova.agent.cli.*;
 import java.io.IOException;
 import java.nio.file.*;
@@ -41,14 +42,13 @@ class FormattingTest {
 
     @Test
     void theDocumentAndTheReportAreAsExpected() throws IOException {
-        Path data = Path.of(AgentHarness.property("velh.data.dir"));
         String json = JsonWriter.write(sample());
-        assertGolden(data.resolve("formatting.json"), json);
-        assertEquals(AWKWARD_NAME, AgentHarness.json(json).getAsJsonArray("systems").get(1)
+        assertGolden(data("formatting.json"), json);
+        assertEquals(AWKWARD_NAME, JsonParser.parseString(json).getAsJsonObject().getAsJsonArray("systems").get(1)
             .getAsJsonObject().get("Name").getAsString());
         assertEquals("\"\\u0001\\u007f\"", JsonWriter.quote("\u0001\u007f"));
         // The name's lone surrogate has no UTF-8 form; its length still sets the column's width.
-        assertGolden(data.resolve("formatting.report"),
+        assertGolden(data("formatting.report"),
             ReportFormatter.format(sample()).replace(AWKWARD_NAME, "Drawer (awkward)"));
     }
 

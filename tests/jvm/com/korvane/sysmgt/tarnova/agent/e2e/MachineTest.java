@@ -50,18 +50,15 @@ class MachineTest {
     private String outcome(String[] test) {
         AgentHarness harness =
             new AgentHarness(temp).onMachine(AgentHarness.sample(test[1])).edit(test[2]);
-        String[] args = test[3].split(" ");
-        AgentHarness.Result result =
-            args[0].startsWith("-") ? harness.agent(args) : harness.scenario(args);
+        AgentHarness.Result result = harness.run(test[3]);
         assertEquals(0, result.exitCode(), result::toString);
         // Each JVM is process 2 of its namespace: its perf data file goes to the run's own /tmp.
         String perfData = "tmp/hsperfdata_" + System.getProperty("user.name");
         assertTrue(Files.isDirectory(result.runDir().resolve(perfData)), result::toString);
         return result.stdout() + "--- driver requests\n"
-            + Objects.requireNonNullElse(AgentHarness.read(result.runDir().resolve("driver/requests.log")), "")
-            + "--- driver blink\n"
-            + Objects.requireNonNullElse(AgentHarness.read(result.runDir().resolve("driver/blink.log")), "")
-            + "--- hardware log\n" + result.hwLog();
+            + Objects.toString(result.file("driver/requests.log"), "") + "--- driver blink\n"
+            + Objects.toString(result.file("driver/blink.log"), "") + "--- hardware log\n"
+            + result.hwLog();
     }
 
     @Test
