@@ -5,6 +5,8 @@
 
 #include <jni.h>
 
+#include <algorithm>
+#include <cstring>
 #include <memory>
 #include <string>
 #include <vector>
@@ -19,15 +21,49 @@ class FakeJni {
   public:
     enum Call { FindClass, NewLongArray, NewObjectArray, NewString, NewStringUTF, Other };
 
-    FakeJni();
+    FakeJni() : previous(current) {
+        table.FindClass = [](JNIEnv*, const char*) { return Ref<jclass>(New(FindClass)); };
+        table.GetObjectClass = [](JNIEnv*, jobject) { return Ref<jclass>(New(Other)); };
+        table.DeleteLocalRef = [](JNIEnv*, jobject ref) { current->LiveLocalRefs -= ref ? 1 : 0; };
+        table.ExceptionCheck = [](JNIEnv*) -> jboolean { return current->ExceptionPending; };
+        table.NewLongArray = [](JNIEnv*, jsize length) {
+            return Ref<jlongArray>(
+                New(NewLongArray, [&](FakeObject& array) { array.longs.assign(length, 0); }));
+        };
+        table.SetLongArrayRegion = [](JNIEnv*, jlongArray array, jsize start, jsize length,
+                                      const jlong* values) {
+            if (InBounds(start, length, Object(array)->longs.size())) {
+                std::copy(values, values + length, Object(array)->longs.begin() + start);
+            }
+        };
+        table.NewObjectArray = [](JNIEnv*, jsize length, jclass, jobject initial) {
+            return Ref<jobjectArray>(New(NewObjectArray, [&](FakeObject& array) {
+                array.elements.assign(length, Object(initial));
+            }));
+        };
+        table.SetObjectArrayElement = [](JNIEnv*, jobjectArray array, jsize index, jobject value) {
+            if (InBounds(index, 1, Object(array)->elements.size())) {
+                Object(array)->elements[index] = Object(value);
+            }
+        };
+        table.NewString = [](JNIEnv*, const jchar* units, jsize length) {
+            return Ref<jstring>(
+                New(NewString, [&](FakeObject& text) { text.text.assign(units, units + length); }));
+        };
+        table.NewStringUTF = [](JNIEnv*, const char* utf) {
+            return Ref<jstring>(New(NewStringUTF, [&](FakeObject& text) {
+                text.text.assign(utf, utf + std::strlen(utf));
+            }));
+        };
+        env.functions = &table;
+        current = this;
+    }
     ~FakeJni() { current = previous; }
     FakeJni(const FakeJni&) = delete;
     FakeJni& operator=(const FakeJni&) = delete;
 
     JNIEnv* Env() { return &env; }
-    static FakeObject* Object(jobject reference) {
-        return reinterpret_cast<FakeObject*>(reference);
-    }
+    static FakeObject* Object(jobject ref) { return reinterpret_cast<FakeObject*>(ref); }
 
     // The nth call (counting from 1) of the function fails; 0: none does.
     int FailAt[Other + 1]{};
@@ -40,15 +76,41 @@ class FakeJni {
     int PeakLocalRefs = 0;
 
   private:
-    static FakeJni* current;
+    static inline FakeJni* current = nullptr;
     FakeJni* previous;
     JNINativeInterface_ table{};
     JNIEnv env{};
     std::vector<std::unique_ptr<FakeObject>> heap;
     int calls[Other + 1]{};
 
+    template <typename T>
+    static T Ref(FakeObject* object) {
+        return reinterpret_cast<T>(object);
+    }
+
     // Counts a call; null for the call chosen to fail, else a new local reference.
-    static FakeObject* New(Call which);
+    template <typename Init = void (*)(FakeObject&)>
+    static FakeObject* New(
+        Call which, Init init = [](FakeObject&) {}) {
+        current->CallsWithException += current->ExceptionPending ? 1 : 0;
+        if (++current->calls[which] == current->FailAt[which]) {
+            current->ExceptionPending = true;
+            return nullptr;
+        }
+        current->heap.push_back(std::make_unique<FakeObject>());
+        current->PeakLocalRefs = std::max(current->PeakLocalRefs, ++current->LiveLocalRefs);
+        init(*current->heap.back());
+        return current->heap.back().get();
+    }
+
     // Stores outside the array raise the exception a JVM raises.
-    static bool InBounds(jsize start, jsize length, size_t size);
+    static bool InBounds(jsize start, jsize length, size_t size) {
+        current->CallsWithException += current->ExceptionPending ? 1 : 0;
+        if (start >= 0 && length >= 0 && size_t(start) + size_t(length) <= size) {
+            return true;
+        }
+        ++current->OutOfBounds;
+        current->ExceptionPending = true;
+        return false;
+    }
 };
