@@ -22,12 +22,16 @@ class FakeJni {
     enum Call { FindClass, NewLongArray, NewObjectArray, NewString, NewStringUTF, Other };
 
     FakeJni() : previous(current) {
-        table.FindClass = [](JNIEnv*, const char*) { return Ref<jclass>(New(FindClass)); };
-        table.GetObjectClass = [](JNIEnv*, jobject) { return Ref<jclass>(New(Other)); };
+        table.FindClass = [](JNIEnv*, const char*) {
+            return reinterpret_cast<jclass>(New(FindClass));
+        };
+        table.GetObjectClass = [](JNIEnv*, jobject) {
+            return reinterpret_cast<jclass>(New(Other));
+        };
         table.DeleteLocalRef = [](JNIEnv*, jobject ref) { current->LiveLocalRefs -= ref ? 1 : 0; };
         table.ExceptionCheck = [](JNIEnv*) -> jboolean { return current->ExceptionPending; };
         table.NewLongArray = [](JNIEnv*, jsize length) {
-            return Ref<jlongArray>(
+            return reinterpret_cast<jlongArray>(
                 New(NewLongArray, [&](FakeObject& array) { array.longs.assign(length, 0); }));
         };
         table.SetLongArrayRegion = [](JNIEnv*, jlongArray array, jsize start, jsize length,
@@ -37,7 +41,7 @@ class FakeJni {
             }
         };
         table.NewObjectArray = [](JNIEnv*, jsize length, jclass, jobject initial) {
-            return Ref<jobjectArray>(New(NewObjectArray, [&](FakeObject& array) {
+            return reinterpret_cast<jobjectArray>(New(NewObjectArray, [&](FakeObject& array) {
                 array.elements.assign(length, Object(initial));
             }));
         };
@@ -47,11 +51,11 @@ class FakeJni {
             }
         };
         table.NewString = [](JNIEnv*, const jchar* units, jsize length) {
-            return Ref<jstring>(
+            return reinterpret_cast<jstring>(
                 New(NewString, [&](FakeObject& text) { text.text.assign(units, units + length); }));
         };
         table.NewStringUTF = [](JNIEnv*, const char* utf) {
-            return Ref<jstring>(New(NewStringUTF, [&](FakeObject& text) {
+            return reinterpret_cast<jstring>(New(NewStringUTF, [&](FakeObject& text) {
                 text.text.assign(utf, utf + std::strlen(utf));
             }));
         };
@@ -59,8 +63,6 @@ class FakeJni {
         current = this;
     }
     ~FakeJni() { current = previous; }
-    FakeJni(const FakeJni&) = delete;
-    FakeJni& operator=(const FakeJni&) = delete;
 
     JNIEnv* Env() { return &env; }
     static FakeObject* Object(jobject ref) { return reinterpret_cast<FakeObject*>(ref); }
@@ -82,11 +84,6 @@ class FakeJni {
     JNIEnv env{};
     std::vector<std::unique_ptr<FakeObject>> heap;
     int calls[Other + 1]{};
-
-    template <typename T>
-    static T Ref(FakeObject* object) {
-        return reinterpret_cast<T>(object);
-    }
 
     // Counts a call; null for the call chosen to fail, else a new local reference.
     template <typename Init = void (*)(FakeObject&)>

@@ -29,8 +29,8 @@ class InventoryTest : public ::testing::Test {
     FakeJni jni;
 };
 
-// A large table, grown since it was counted.
-TEST_F(InventoryTest, ElementsStayWithinTheArrayAndTheLocalReferencesOfANativeMethod) {
+// A large table, grown since it was counted; each JNI call that can fail, failing.
+TEST_F(InventoryTest, ElementsStayWithinTheArrayAndTheLocalReferencesAndAFailedCallEndsTheBuild) {
     for (int i = 0; i < 5000; ++i) {
         SlotList.Add(new SlotDescriptor{});
         AdapterList.Add(new AdapterDescriptor);
@@ -43,27 +43,20 @@ TEST_F(InventoryTest, ElementsStayWithinTheArrayAndTheLocalReferencesOfANativeMe
     EXPECT_EQ(jni.OutOfBounds, 0);
     // A JVM guarantees 16 local references to a native method.
     EXPECT_LE(jni.PeakLocalRefs, 16);
-}
 
-TEST_F(InventoryTest, AFailedJniCallGivesNullAndNoFurtherCall) {
-    for (int i = 0; i < 3; ++i) {
-        BusList.Add(new BusDescriptor{});
-        SystemList.Add(new SystemDescriptor);
-    }
-    CountInventories();
     const struct {
         const char* what;
         FakeJni::Call failing;
         int at;
         jobjectArray (*build)(JNIEnv*);
     } cases[] = {
-        {"class sample", FakeJni::NewLongArray, 1, BusNumInv},
-        {"result", FakeJni::NewObjectArray, 1, BusNumInv},
-        {"third element", FakeJni::NewLongArray, 4, BusNumInv},
-        {"String class", FakeJni::FindClass, 1, SystemNameInv},
-        {"empty string", FakeJni::NewStringUTF, 1, SystemNameInv},
-        {"string result", FakeJni::NewObjectArray, 1, SystemNameInv},
-        {"second string", FakeJni::NewString, 2, SystemNameInv},
+        {"class sample", FakeJni::NewLongArray, 1, SlotNumInv},
+        {"result", FakeJni::NewObjectArray, 1, SlotNumInv},
+        {"third element", FakeJni::NewLongArray, 4, SlotNumInv},
+        {"String class", FakeJni::FindClass, 1, AdapterNameInv},
+        {"empty string", FakeJni::NewStringUTF, 1, AdapterNameInv},
+        {"string result", FakeJni::NewObjectArray, 1, AdapterNameInv},
+        {"second string", FakeJni::NewString, 2, AdapterNameInv},
     };
     for (const auto& c : cases) {
         SCOPED_TRACE(c.what);

@@ -41,11 +41,8 @@ int ExitCode(pid_t child) {
 
 }  // namespace
 
-TEST(SlotwatchProgram, RefusesAnUnknownOption) {
+TEST(SlotwatchProgram, LogsEachChangeOfTheDeviceListAndRefusesAnUnknownOption) {
     EXPECT_EQ(ExitCode(Start({"--once", "--bogus", "5"})), 2);
-}
-
-TEST(SlotwatchProgram, LogsEachChangeOfTheDeviceListInKeyOrderAndStopsOnTerm) {
     ScratchDir dir;
     const std::string devices = dir.Path("devices");
     // Replaced whole, so that no read sees half a list.

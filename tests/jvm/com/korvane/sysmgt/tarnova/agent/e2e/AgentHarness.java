@@ -65,9 +65,16 @@ final class AgentHarness {
     /** A shell command run in the machine's copy; $SAMPLES is the folder of the samples. */
     AgentHarness edit(String command) { edit = command; return this; }
 
-    AgentHarness env(String name, String value) { environment.put(name, value); return this; }
+    /** Makes the first COUNT fork() calls fail as they fail when the process table is full. */
+    AgentHarness forkFailures(String count) {
+        environment.putAll(
+            Map.of("LD_PRELOAD", property("velh.forkfail.lib"), "VELH_FORK_FAILURES", count));
+        return this;
+    }
 
-    Result agent(String... args) { return run("com.korvane.sysmgt.tarnova.agent.TarnovaAgent", args); }
+    Result agent(String... args) {
+        return run("com.korvane.sysmgt.tarnova.agent.TarnovaAgent", args);
+    }
 
     /** Split at spaces: the agent's arguments if the first begins with "-", else the steps. */
     Result run(String line) {
@@ -80,7 +87,7 @@ final class AgentHarness {
             Path root = Files.createTempDirectory(base, "run");
             Path bin = Files.createDirectories(root.resolve("bin"));
             for (String program : List.of("slotwatch", "killall")) {
-                Files.writeString(bin.resolve(program), "#!/bin/sh\necho \"${0##*/}${*:+ $*}\" >> '"
+                Files.writeString(bin.resolve(program), "#!/bin/sh\necho \"${0##*/}${*:+ $*}\" >>'"
                     + root.resolve("calls-" + program) + "'\n");
                 bin.resolve(program).toFile().setExecutable(true);
             }

@@ -3,31 +3,29 @@ package com.korvane.sysmgt.tarnova.agent.e2e;
 import static com.korvane.sysmgt.tarnova.agent.e2e.AgentHarness.*;
 import static org.junit.jupiter.api.Assertions.*;
 
+import com.google.gson.JsonParser;
+import com.korvane.sysmgt.tarnova.agent.cli.*;
 import java.nio.file.*;
 import java.util.*;
 import java.util.regex.*;
+import java.util.stream.LongStream;
 import org.junit.jupiter.api.Test;
 import org.junit.jupiter.api.io.TempDir;
 import org.junit.jupiter.params.ParameterizedTest;
 import org.junit.jupiter.params.provider.CsvSource;
 
-/** The library's entry points and the agent's command line, in a JVM, without a slot table. */
+/**
+ * The library's entry points and the agent's command line, in a JVM, without a slot table; the
+ * JSON document and the report of inventories with content, against data/formatting.*.
+ */
 class AgentTest {
     @TempDir
     Path temp;
 
-    /** A run that ended well; -Xcheck:jni reports misuse of the JNI on standard output. */
-    private static AgentHarness.Result clean(AgentHarness.Result result) {
-        assertEquals(0, result.exitCode(), result::toString);
-        assertFalse(result.stdout().contains("WARNING") || result.stderr().contains("FATAL"),
-            result::toString);
-        return result;
-    }
-
     /**
-     * What the steps (or the command line) printed and the JNI log equal data/jni-NAME.log, with
-     * the status that this host gets masked; the monitor was started and stopped as often as
-     * given. FORK_FAILURES makes that many fork() calls fail.
+     * What the steps or the command line printed (with any warning of -Xcheck:jni) and the JNI
+     * log equal data/jni-NAME.log, the status this host gets masked; the monitor was started and
+     * stopped as often as given, with FORK_FAILURES failing fork() calls.
      */
     @ParameterizedTest
     @CsvSource({"lifecycle, 0, 1, 1, debug hwinfo version status inventories blink:4294967301:1 "
@@ -39,49 +37,89 @@ class AgentTest {
         "relaunch, 0, 1, 2, debug hwinfo hwinfo exit debug hwinfo exit",
         "fork-retried, 1, 1, 1, debug hwinfo hwinfo hwinfo exit",
         "fork-failed, 1000000, 0, 0, debug hwinfo hwinfo hwinfo exit",
-        "command-json, 0, 1, 1, --json", "command-blink, 0, 1, 1, --blink 4294967301 1"})
+        "command-json, 0, 1, 1, --json", "command-blink, 0, 1, 1, --blink 4294967301 1",
+        // Finished children do not pile up as zombies.
+        "children, 0, 1, 20, hwinfo exit exit exit exit exit exit exit exit exit exit exit exit "
+            + "exit exit exit exit exit exit exit exit hwinfo children"})
     void theJniLogTellsTheLifecycle(String name, String forkFailures, int launches, int stops,
         String steps) throws Exception {
-        AgentHarness.Result result = clean(new AgentHarness(temp).withJniLog()
-            .env("LD_PRELOAD", property("velh.forkfail.lib"))
-            .env("VELH_FORK_FAILURES", forkFailures).run(steps));
+        AgentHarness.Result result =
+            new AgentHarness(temp).withJniLog().forkFailures(forkFailures).run(steps);
+        assertEquals(0, result.exitCode(), result::toString);
         String stdout = result.stdout();
         String log = result.jniLog();
         Matcher status = Pattern.compile("status\"?[=:] ?(\\d+)").matcher(stdout);
         if (status.find()) {
-            // A zero-extended 32-bit code.
-            long value = Long.parseLong(status.group(1));
-            assertTrue(value <= 0xFFFFFFFFL, stdout);
-            stdout = stdout.replace(status.group(), status.group().replace(status.group(1), "STATUS"));
-            log = log.replace("Status=" + Long.toHexString(value) + " ", "Status=STATUS ");
+            String value = status.group(1);
+            stdout = stdout.replace(status.group(), status.group().replace(value, "STATUS"));
+            log = log.replace("Status=" + Long.toHexString(Long.parseLong(value)) + " ",
+                "Status=STATUS ");
         }
         assertGolden(data("jni-" + name + ".log"), stdout + "--- jni.log\n" + log);
-        assertEquals(Collections.nCopies(launches, "slotwatch"), result.calls("slotwatch", launches));
-        assertEquals(Collections.nCopies(stops, "killall slotwatch"), result.calls("killall", stops));
-    }
-
-    @Test
-    void finishedChildrenDoNotPileUpAsZombies() throws Exception {
-        AgentHarness.Result result =
-            clean(new AgentHarness(temp).run("hwinfo " + "exit ".repeat(20) + "hwinfo children"));
-        assertEquals(20, result.calls("killall", 20).size());
-        assertEquals("children=0\n", result.stdout());
+        assertEquals(Collections.nCopies(launches, "slotwatch"),
+            result.calls("slotwatch", launches));
+        assertEquals(Collections.nCopies(stops, "killall slotwatch"),
+            result.calls("killall", stops));
     }
 
     @Test
     void theReportAndBadArgumentsWithTheUsageAndExitCode2() throws Exception {
-        AgentHarness.Result report = clean(new AgentHarness(temp).agent());
-        assertGolden(data("empty.report"), report.stdout().replaceFirst("Status: .*", "Status: STATUS"));
+        AgentHarness.Result report = new AgentHarness(temp).agent();
+        assertEquals(0, report.exitCode(), report::toString);
+        assertGolden(data("empty.report"),
+            report.stdout().replaceFirst("Status: .*", "Status: STATUS"));
         assertNull(report.jniLog(), "a JNI log is never created");
         // Without touching the library.
         for (String args : List.of("--blink 1", "--blink x 1", "--blink 1 99999999999",
                  "--json extra", "--report", "json")) {
-            AgentHarness.Result result = new AgentHarness(temp).withJniLog().agent(args.split(" "));
+            AgentHarness.Result result =
+                new AgentHarness(temp).withJniLog().agent(args.split(" "));
             assertEquals(2, result.exitCode(), () -> args + ": " + result);
             assertEquals("", result.stdout() + result.jniLog(), args);
             assertTrue(result.stderr().contains("usage: TarnovaAgent [--json | --blink SLOT STATE]"),
                 () -> args + ": " + result.stderr());
             assertNull(result.hwLog(), args);
         }
+    }
+
+    private static final long NONE = 4294967295L;
+    private static final String AWKWARD_NAME = "Drawer \"A\"\\1\n\t\u00e9\u20ac\ud83d";
+
+    private static Inventory sample() {
+        long[] bus = LongStream.range(100, 112).toArray();
+        bus[9] = NONE;
+        long[] adapter = LongStream.range(300, 312).toArray();
+        adapter[1] = NONE;
+        return new Inventory("4.20", 7,
+            new InventoryTable("systems", InventoryTable.SYSTEM_FIELDS,
+                new long[][] {{0, 1, 0, 255, 1, 4}, {1, 2, 255, 0, NONE, 0}})
+                .withText("Name", new String[] {"Chassis", AWKWARD_NAME}),
+            new InventoryTable("busses", InventoryTable.BUS_FIELDS, new long[][] {bus}),
+            new InventoryTable("slots", InventoryTable.SLOT_FIELDS, new long[0][]),
+            new InventoryTable("adapters", InventoryTable.ADAPTER_FIELDS,
+                new long[][] {adapter}).withText("Name", new String[] {""})
+                .withText("PciId", new String[] {"8086:1229"})
+                .withText("Driver", new String[] {"<Unavailable>"}));
+    }
+
+    @Test
+    void theDocumentAndTheReportOfInventoriesWithContentAreAsExpected() throws Exception {
+        String json = JsonWriter.write(sample());
+        assertGolden(data("formatting.json"), json);
+        assertEquals(AWKWARD_NAME, JsonParser.parseString(json).getAsJsonObject()
+            .getAsJsonArray("systems").get(1).getAsJsonObject().get("Name").getAsString());
+        assertEquals("\"\\u0001\\u007f\"", JsonWriter.quote("\u0001\u007f"));
+        // The name's lone surrogate has no UTF-8 form; its length still sets the column's width.
+        assertGolden(data("formatting.report"),
+            ReportFormatter.format(sample()).replace(AWKWARD_NAME, "Drawer (awkward)"));
+    }
+
+    @Test
+    void anElementOfTheWrongLengthIsRejected() {
+        assertThrows(IllegalArgumentException.class, () -> new InventoryTable("busses",
+            InventoryTable.BUS_FIELDS, new long[][] {new long[11]}));
+        assertThrows(IllegalArgumentException.class, () -> new InventoryTable("busses",
+            InventoryTable.BUS_FIELDS, new long[][] {null}));
+        assertEquals(0, new InventoryTable("busses", InventoryTable.BUS_FIELDS, null).size());
     }
 }

@@ -19,11 +19,9 @@ class CaptureTest {
         List<String> command = new ArrayList<>(List.of(simulator));
         Path machines = Path.of(AgentHarness.property("velh.machines.dir"));
         command.addAll(List.of(machines.resolveSibling("capture").toString(), folder.toString()));
-        Path out = temp.resolve("capture.out");
-        ProcessBuilder builder = new ProcessBuilder(command).directory(temp.toFile())
-            .redirectErrorStream(true).redirectOutput(out.toFile());
+        ProcessBuilder builder = new ProcessBuilder(command).directory(temp.toFile()).inheritIO();
         builder.environment().put("VELHSIM_BUILD_DIR", buildDir);
-        assertEquals(0, builder.start().waitFor(), Files.readString(out));
+        assertEquals(0, builder.start().waitFor(), command::toString);
     }
 
     /** The agent's document on the machine. */

@@ -17,7 +17,8 @@ import org.junit.jupiter.api.io.TempDir;
 class MachineTest {
     private static final String ERRORS_ONLY = "echo 'hwdbgprint 0x0' >install/dbgprint; echo ";
     private static final String SCENARIO = "hwinfo status inventories blink:3:1 exit";
-    private static final String TYPE_FILE = "cp $SAMPLES/chassis-drawer/driver/asl.pci install/K320.pci";
+    private static final String TYPE_FILE =
+        "cp $SAMPLES/chassis-drawer/driver/asl.pci install/K320.pci";
 
     /** Name, sample, shell edit of its copy, then the agent's arguments or the scenario's steps. */
     private static final String[][] CASES = {
