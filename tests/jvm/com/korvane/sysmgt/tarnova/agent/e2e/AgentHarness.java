@@ -4,7 +4,6 @@ import static org.junit.jupiter.api.Assertions.*;
 
 import java.io.File;
 import java.io.IOException;
-import java.io.UncheckedIOException;
 import java.nio.charset.StandardCharsets;
 import java.nio.file.*;
 import java.util.*;
@@ -25,11 +24,8 @@ final class AgentHarness {
     private final Map<String, String> environment = new HashMap<>();
 
     AgentHarness(Path base) { this.base = base; }
-
     static String property(String name) { return Path.of(System.getProperty(name)).toString(); }
-
     static Path sample(String name) { return Path.of(property("velh.machines.dir"), name); }
-
     static Path data(String name) { return Path.of(property("velh.data.dir"), name); }
 
     static void copyTree(Path from, Path to) throws IOException, InterruptedException {
@@ -48,18 +44,13 @@ final class AgentHarness {
     }
 
     /** A file's text, decoded leniently (a log is checked, not trusted), or null without one. */
-    static String read(Path file) {
-        try {
-            return Files.exists(file) ? new String(Files.readAllBytes(file), StandardCharsets.UTF_8)
-                                      : null;
-        } catch (IOException e) {
-            throw new UncheckedIOException(e);
-        }
+    static String read(Path file) throws IOException {
+        return Files.exists(file) ? new String(Files.readAllBytes(file), StandardCharsets.UTF_8)
+                                  : null;
     }
 
     /** Creates an empty "../log/jni.log", which switches the JNI-side log on. */
     AgentHarness withJniLog() { jniLog = true; return this; }
-
     AgentHarness onMachine(Path folder) { machine = folder; return this; }
 
     /** A shell command run in the machine's copy; $SAMPLES is the folder of the samples. */
@@ -146,14 +137,12 @@ final class AgentHarness {
 
     /** What a run left behind; runDir holds install/, log/ and the machine's files. */
     record Result(Path root, Path runDir, int exitCode, String stdout, String stderr) {
-        String file(String path) { return read(runDir.resolve(path)); }
-
-        String jniLog() { return file("log/jni.log"); }
-
-        String hwLog() { return file("log/velhslot.slotmgr.hwinfo.log"); }
+        String file(String path) throws IOException { return read(runDir.resolve(path)); }
+        String jniLog() throws IOException { return file("log/jni.log"); }
+        String hwLog() throws IOException { return file("log/velhslot.slotmgr.hwinfo.log"); }
 
         /** The runs of a stand-in, which may end after the JVM: waits for atLeast, then 0.3 s. */
-        List<String> calls(String program, int atLeast) throws InterruptedException {
+        List<String> calls(String program, int atLeast) throws Exception {
             Path record = root.resolve("calls-" + program);
             for (int i = 0; i < 500 && calls(record).size() < atLeast; i++) {
                 Thread.sleep(20);
@@ -162,7 +151,7 @@ final class AgentHarness {
             return calls(record);
         }
 
-        private static List<String> calls(Path record) {
+        private static List<String> calls(Path record) throws IOException {
             String text = read(record);
             return text == null ? List.of() : text.lines().toList();
         }

@@ -48,7 +48,7 @@ class MachineTest {
     @TempDir
     Path temp;
 
-    private String outcome(String[] test) {
+    private String outcome(String[] test) throws Exception {
         AgentHarness harness =
             new AgentHarness(temp).onMachine(AgentHarness.sample(test[1])).edit(test[2]);
         AgentHarness.Result result = harness.run(test[3]);
