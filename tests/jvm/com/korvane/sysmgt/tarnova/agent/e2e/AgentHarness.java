@@ -52,7 +52,6 @@ final class AgentHarness {
     /** Creates an empty "../log/jni.log", which switches the JNI-side log on. */
     AgentHarness withJniLog() { jniLog = true; return this; }
     AgentHarness onMachine(Path folder) { machine = folder; return this; }
-
     /** A shell command run in the machine's copy; $SAMPLES is the folder of the samples. */
     AgentHarness edit(String command) { edit = command; return this; }
 
@@ -144,16 +143,12 @@ final class AgentHarness {
         /** The runs of a stand-in, which may end after the JVM: waits for atLeast, then 0.3 s. */
         List<String> calls(String program, int atLeast) throws Exception {
             Path record = root.resolve("calls-" + program);
-            for (int i = 0; i < 500 && calls(record).size() < atLeast; i++) {
+            for (int i = 0; i < 500 && Objects.toString(read(record), "").lines().count() < atLeast;
+                 i++) {
                 Thread.sleep(20);
             }
             Thread.sleep(300);
-            return calls(record);
-        }
-
-        private static List<String> calls(Path record) throws IOException {
-            String text = read(record);
-            return text == null ? List.of() : text.lines().toList();
+            return Objects.toString(read(record), "").lines().toList();
         }
 
         @Override
