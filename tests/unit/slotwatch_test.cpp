@@ -1,106 +1,99 @@
+// The monitor as a program: its log of a device list that changes under it, and its options.
 #include <gtest/gtest.h>
 #include <signal.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
 #include <chrono>
-#include <cstdlib>
-#include <filesystem>
-#include <fstream>
+#include <ctime>
 #include <sstream>
 #include <string>
 #include <thread>
+#include <vector>
 
-#include "slotwatch/devlist.h"
-
-namespace fs = std::filesystem;
+#include "scratchdir.h"
 
 namespace {
 
-std::string Line(const char* key, const char* ids, const char* driver) {
-    std::string line = std::string(key) + "\t" + ids + "\t5";
-    for (int i = 0; i < 14; ++i) {
-        line += "\t00000000";
-    }
-    if (driver != nullptr) {
-        line += std::string("\t") + driver;
-    }
-    return line + "\n";
+// Key, vendor and device, interrupt, seven base addresses and seven sizes, and maybe a driver.
+std::string Line(const char* key, const char* ids, const char* driver = nullptr) {
+    return std::string(key) + "\t" + ids + "\t5\t0\t0\t0\t0\t0\t0\t0\t0\t0\t0\t0\t0\t0\t0" +
+           (driver != nullptr ? std::string("\t") + driver : "") + "\n";
 }
 
-std::string ReadAll(const fs::path& path) {
-    std::ifstream in(path);
-    std::stringstream text;
-    text << in.rdbuf();
-    return text.str();
+pid_t Start(std::vector<const char*> args) {
+    args.insert(args.begin(), "slotwatch");
+    args.push_back(nullptr);
+    pid_t child = fork();
+    if (child == 0) {
+        execv(SLOTWATCH_BINARY, const_cast<char**>(args.data()));
+        _exit(127);
+    }
+    return child;
+}
+
+int ExitCode(pid_t child) {
+    int status = 0;
+    EXPECT_EQ(waitpid(child, &status, 0), child);
+    return WIFEXITED(status) ? WEXITSTATUS(status) : -1;
 }
 
 }  // namespace
 
-TEST(SlotwatchDeviceList, ParsesKernelLinesAndSkipsMalformedOnes) {
-    std::istringstream in(Line("0018", "80861010", "e1000") + Line("02fb", "10de0020", nullptr) +
-                          "garbage line\n" + Line("zz00", "80861010", nullptr) + "\n");
-    int skipped = 0;
-    DeviceList list = ParseDeviceList(in, &skipped);
-    EXPECT_EQ(skipped, 2);
-    ASSERT_EQ(list.size(), 2u);
-    EXPECT_EQ(DescribeFunction(list.at(0x0018)), "00:03.0 8086:1010 e1000");
-    EXPECT_EQ(DescribeFunction(list.at(0x02fb)), "02:1f.3 10de:0020");
-}
-
-TEST(SlotwatchDeviceList, DiffReportsAddedRemovedAndChangedInKeyOrder) {
-    std::istringstream first(Line("0008", "80861010", "e1000") + Line("0010", "10de0020", nullptr) +
-                             Line("0100", "9005008f", "aic79xx"));
-    std::istringstream second(Line("0008", "80861010", nullptr) + Line("0018", "14e41644", "tg3") +
-                              Line("0100", "9005008f", "aic79xx"));
-    DeviceList before = ParseDeviceList(first, nullptr);
-    DeviceList after = ParseDeviceList(second, nullptr);
-    std::vector<std::string> expected = {
-        "changed 00:01.0 8086:1010 e1000 -> 00:01.0 8086:1010",
-        "removed 00:02.0 10de:0020",
-        "added 00:03.0 14e4:1644 tg3",
+TEST(SlotwatchProgram, LogsEachChangeOfTheDeviceListAndRefusesAnUnknownOption) {
+    EXPECT_EQ(ExitCode(Start({"--once", "--bogus", "5"})), 2);
+    ScratchDir dir;
+    const std::string devices = dir.Path("devices");
+    // Replaced whole, so that no read sees half a list.
+    auto write = [&](const std::string& text) {
+        dir.Write("devices.new", text);
+        ASSERT_EQ(std::rename(dir.Path("devices.new").c_str(), devices.c_str()), 0);
     };
-    EXPECT_EQ(DiffDeviceLists(before, after), expected);
-    EXPECT_TRUE(DiffDeviceLists(after, after).empty());
-}
-
-TEST(SlotwatchProgram, LogsHotPlugEventsAndStopsOnTerm) {
-    fs::path dir = fs::temp_directory_path() / ("slotwatch-" + std::to_string(getpid()));
-    fs::create_directories(dir);
-    fs::path devices = dir / "devices";
-    fs::path log = dir / "slotwatch.log";
-    std::ofstream(devices) << Line("0008", "80861010", "e1000");
-
-    pid_t child = fork();
-    ASSERT_GE(child, 0);
-    if (child == 0) {
-        execl(SLOTWATCH_BINARY, "slotwatch", "--devices", devices.c_str(), "--log", log.c_str(),
-              "--interval", "0.05", static_cast<char*>(nullptr));
-        _exit(127);
-    }
-    auto waitFor = [&](const std::string& text) {
-        for (int i = 0; i < 400; ++i) {
-            if (ReadAll(log).find(text) != std::string::npos) {
-                return true;
-            }
+    write(Line("0008", "80861010", "e1000") + Line("0010", "10de0020") + "garbage line\n" +
+          Line("zz00", "80861010") + "\n");
+    pid_t child = Start(
+        {"--devices", devices.c_str(), "--log", dir.Path("log").c_str(), "--interval", "0.05"});
+    ASSERT_GT(child, 0);
+    // The log without its times, once it holds the line wanted.
+    auto logUntil = [&](const std::string& last) {
+        std::string log;
+        for (int i = 0; i < 400 && log.find(last) == std::string::npos; ++i) {
             std::this_thread::sleep_for(std::chrono::milliseconds(25));
+            log = dir.Read("log");
         }
-        return false;
+        std::istringstream lines(log);
+        std::string bare;
+        for (std::string line; std::getline(lines, line);) {
+            struct tm time {};
+            const char* rest = strptime(line.c_str(), "%Y-%m-%dT%H:%M:%S ", &time);
+            bare += std::string(rest != nullptr ? rest : line.c_str()) + "\n";
+        }
+        return bare;
     };
-    EXPECT_TRUE(waitFor("1 function(s) present"));
-    std::ofstream(devices) << Line("0008", "80861010", "e1000") +
-                                  Line("0110", "9005008f", "aic79xx");
-    EXPECT_TRUE(waitFor("added 01:02.0 9005:008f aic79xx"));
-    fs::remove(devices);
-    EXPECT_TRUE(waitFor("error: " + devices.string()));
-    std::ofstream(devices) << Line("0110", "9005008f", "aic79xx");
-    EXPECT_TRUE(waitFor("removed 00:01.0 8086:1010 e1000"));
-
+    logUntil("skipped");
+    write(Line("0008", "80861010") + Line("0018", "14e41644", "tg3") +
+          Line("02fb", "9005008f", "aic79xx"));
+    logUntil("02:1f.3");
+    std::remove(devices.c_str());
+    logUntil("No such file");
+    write(Line("02fb", "9005008f", "aic79xx"));
+    logUntil("removed 00:03.0");
     kill(child, SIGTERM);
-    int status = 0;
-    ASSERT_EQ(waitpid(child, &status, 0), child);
-    EXPECT_TRUE(WIFEXITED(status));
-    EXPECT_EQ(WEXITSTATUS(status), 0);
-    EXPECT_NE(ReadAll(log).find("slotwatch stopped"), std::string::npos);
-    fs::remove_all(dir);
+    EXPECT_EQ(ExitCode(child), 0);
+    EXPECT_EQ(logUntil("stopped"), "slotwatch started, watching " + devices +
+                                       ", 2 function(s) present\n"
+                                       "error: " +
+                                       devices +
+                                       ": 2 malformed line(s) skipped\n"
+                                       "changed 00:01.0 8086:1010 e1000 -> 00:01.0 8086:1010\n"
+                                       "removed 00:02.0 10de:0020\n"
+                                       "added 00:03.0 14e4:1644 tg3\n"
+                                       "added 02:1f.3 9005:008f aic79xx\n"
+                                       "error: " +
+                                       devices +
+                                       ": No such file or directory\n"
+                                       "device list readable again\n"
+                                       "removed 00:01.0 8086:1010\n"
+                                       "removed 00:03.0 14e4:1644 tg3\n"
+                                       "slotwatch stopped\n");
 }

@@ -2,16 +2,12 @@ package com.korvane.sysmgt.tarnova.agent.e2e;
 
 import static org.junit.jupiter.api.Assertions.*;
 
-import com.google.gson.*;
 import java.io.File;
 import java.io.IOException;
-import java.io.UncheckedIOException;
 import java.nio.charset.StandardCharsets;
 import java.nio.file.*;
 import java.util.*;
 import java.util.concurrent.TimeUnit;
-import java.util.regex.Pattern;
-import java.util.stream.Collectors;
 
 /**
  * Runs a main class in a fresh JVM that loads the JNI library: in ROOT/run (install/, log/), with
@@ -20,29 +16,17 @@ import java.util.stream.Collectors;
  * JVM is that 32-bit one under qemu-i386, the simulator that of the build velh.sim.build.dir.
  */
 final class AgentHarness {
-    interface Edit {
-        void apply(Path machine) throws IOException;
-    }
-
+    private static final String I386_JAVA = System.getProperty("velh.i386.java", "");
     private final Path base;
-    private String i386Java = System.getProperty("velh.i386.java", "");
-    private Path libraryDir = Path.of(property("velh.build.dir"));
     private boolean jniLog;
     private Path machine;
+    private String edit = "";
     private final Map<String, String> environment = new HashMap<>();
-    private final List<Edit> edits = new ArrayList<>();
 
     AgentHarness(Path base) { this.base = base; }
-
     static String property(String name) { return Path.of(System.getProperty(name)).toString(); }
-
     static Path sample(String name) { return Path.of(property("velh.machines.dir"), name); }
-
-    static int occurrences(String text, String part) {
-        return text.split(Pattern.quote(part), -1).length - 1;
-    }
-
-    static JsonObject json(String text) { return JsonParser.parseString(text).getAsJsonObject(); }
+    static Path data(String name) { return Path.of(property("velh.data.dir"), name); }
 
     static void copyTree(Path from, Path to) throws IOException, InterruptedException {
         assertEquals(0, new ProcessBuilder("cp", "-rT", "--preserve=mode", from.toString(),
@@ -52,70 +36,64 @@ final class AgentHarness {
     /** Equal to the file, or with VELH_GOLDEN_UPDATE=1 written to it instead, for review. */
     static void assertGolden(Path expected, String actual) throws IOException {
         if ("1".equals(System.getenv("VELH_GOLDEN_UPDATE"))) {
+            Files.createDirectories(expected.getParent());
             Files.writeString(expected, actual);
         }
         assertEquals(Objects.requireNonNullElse(read(expected), "(missing)"), actual,
             expected::toString);
     }
 
-    /** The systems, busses and slots of data/NAME, field by field, but for the ignored ones. */
-    static void assertTopology(String name, JsonObject document, String... ignored)
-        throws IOException {
-        JsonObject expected = json(Files.readString(Path.of(property("velh.data.dir"), name)));
-        for (String kind : List.of("systems", "busses", "slots")) {
-            JsonArray want = expected.getAsJsonArray(kind);
-            JsonArray got = document.getAsJsonArray(kind).deepCopy();
-            for (JsonArray array : List.of(want, got)) {
-                array.forEach(element -> List.of(ignored).forEach(element.getAsJsonObject()::remove));
-            }
-            assertEquals(want, got, kind);
-        }
+    /** A file's text, decoded leniently (a log is checked, not trusted), or null without one. */
+    static String read(Path file) throws IOException {
+        return Files.exists(file) ? new String(Files.readAllBytes(file), StandardCharsets.UTF_8)
+                                  : null;
     }
 
     /** Creates an empty "../log/jni.log", which switches the JNI-side log on. */
     AgentHarness withJniLog() { jniLog = true; return this; }
+    AgentHarness onMachine(Path folder) { machine = folder; return this; }
+    /** A shell command run in the machine's copy; $SAMPLES is the folder of the samples. */
+    AgentHarness edit(String command) { edit = command; return this; }
 
-    /** The 64-bit JVM and library of velh.sim.build.dir. */
-    AgentHarness on64Bit() {
-        i386Java = "";
-        libraryDir = Path.of(property("velh.sim.build.dir"));
+    /** Makes the first COUNT fork() calls fail as they fail when the process table is full. */
+    AgentHarness forkFailures(String count) {
+        environment.putAll(
+            Map.of("LD_PRELOAD", property("velh.forkfail.lib"), "VELH_FORK_FAILURES", count));
         return this;
     }
 
-    AgentHarness onMachine(Path folder) { machine = folder; return this; }
-
-    AgentHarness edit(Edit edit) { edits.add(edit); return this; }
-
-    AgentHarness env(String name, String value) { environment.put(name, value); return this; }
-
-    Result scenario(String... steps) { return run(Scenario.class.getName(), steps); }
-
     Result agent(String... args) {
         return run("com.korvane.sysmgt.tarnova.agent.TarnovaAgent", args);
+    }
+
+    /** Split at spaces: the agent's arguments if the first begins with "-", else the steps. */
+    Result run(String line) {
+        String[] args = line.split(" ");
+        return line.startsWith("-") ? agent(args) : run(Scenario.class.getName(), args);
     }
 
     private Result run(String mainClass, String... args) {
         try {
             Path root = Files.createTempDirectory(base, "run");
             Path bin = Files.createDirectories(root.resolve("bin"));
-            Path calls = Files.createDirectories(root.resolve("calls"));
             for (String program : List.of("slotwatch", "killall")) {
-                Files.writeString(bin.resolve(program),
-                    "#!/bin/sh\necho \"${0##*/}${*:+ $*}\" >> '" + calls.resolve(program) + "'\n");
+                Files.writeString(bin.resolve(program), "#!/bin/sh\necho \"${0##*/}${*:+ $*}\" >>'"
+                    + root.resolve("calls-" + program) + "'\n");
                 bin.resolve(program).toFile().setExecutable(true);
             }
             Path run = root.resolve("run");
             Path logDir = run.resolve("log");
+            boolean i386 = !I386_JAVA.isEmpty();
             List<String> command = new ArrayList<>();
-            boolean i386 = !i386Java.isEmpty();
             if (machine != null) {
                 Path copy = root.resolve("machine");
                 copyTree(machine, copy);
-                for (Edit edit : edits) {
-                    edit.apply(copy);
-                }
+                ProcessBuilder shell =
+                    new ProcessBuilder("sh", "-ec", edit).inheritIO().directory(copy.toFile());
+                shell.environment().put("SAMPLES", property("velh.machines.dir"));
+                assertEquals(0, shell.start().waitFor(), edit);
                 logDir = copy.resolve("log");
-                String sim = System.getProperty("velh.sim.build.dir", libraryDir.toString());
+                String sim = System.getProperty("velh.sim.build.dir", property("velh.build.dir"));
                 command.addAll(List.of(sim + "/sim/velhsim", "--machine", copy.toString(),
                     "--run-dir", run.toString(), i386 ? "--i386" : "--"));
                 command.addAll(i386 ? List.of("--") : List.of());
@@ -128,11 +106,11 @@ final class AgentHarness {
             if (jniLog) {
                 Files.createFile(logDir.resolve("jni.log"));
             }
-            command.add(i386 ? i386Java : System.getProperty("java.home") + "/bin/java");
+            command.add(i386 ? I386_JAVA : System.getProperty("java.home") + "/bin/java");
             // Under qemu only the interpreter: the JIT's code patching across threads now and
             // then trips the JVM's own checks.
             command.addAll(i386 ? List.of("-Xcheck:jni", "-Xint") : List.of("-Xcheck:jni"));
-            command.addAll(List.of("-Djava.library.path=" + libraryDir, "-cp",
+            command.addAll(List.of("-Djava.library.path=" + property("velh.build.dir"), "-cp",
                 property("velh.agent.jar") + File.pathSeparator + property("velh.test.jar"),
                 mainClass));
             command.addAll(List.of(args));
@@ -142,9 +120,8 @@ final class AgentHarness {
                 .redirectInput(new File("/dev/null"))
                 // Under the simulator the install directory exists only once the launcher made it.
                 .directory(machine != null ? root.toFile() : run.resolve("install").toFile());
-            Map<String, String> env = builder.environment();
-            env.put("PATH", bin + File.pathSeparator + env.getOrDefault("PATH", "/usr/bin:/bin"));
-            env.putAll(environment);
+            builder.environment().merge("PATH", bin.toString(), (path, ours) -> ours + ":" + path);
+            builder.environment().putAll(environment);
             Process process = builder.start();
             if (!process.waitFor(i386 ? 300 : 60, TimeUnit.SECONDS)) {
                 process.destroyForcibly().waitFor();
@@ -157,44 +134,21 @@ final class AgentHarness {
         }
     }
 
-    /** A file's text, decoded leniently (a log is checked, not trusted), or null without one. */
-    static String read(Path file) {
-        try {
-            return Files.exists(file)
-                ? new String(Files.readAllBytes(file), StandardCharsets.UTF_8) : null;
-        } catch (IOException e) {
-            throw new UncheckedIOException(e);
-        }
-    }
-
-    private static List<String> lines(Path file) {
-        String text = read(file);
-        return text == null ? List.of() : text.lines().collect(Collectors.toList());
-    }
-
     /** What a run left behind; runDir holds install/, log/ and the machine's files. */
     record Result(Path root, Path runDir, int exitCode, String stdout, String stderr) {
-        String jniLog() { return read(runDir.resolve("log/jni.log")); }
-
-        String hwLog() { return read(runDir.resolve("log/velhslot.slotmgr.hwinfo.log")); }
-
-        JsonObject document() { return json(stdout); }
-
-        List<String> driverRequests() { return lines(runDir.resolve("driver/requests.log")); }
+        String file(String path) throws IOException { return read(runDir.resolve(path)); }
+        String jniLog() throws IOException { return file("log/jni.log"); }
+        String hwLog() throws IOException { return file("log/velhslot.slotmgr.hwinfo.log"); }
 
         /** The runs of a stand-in, which may end after the JVM: waits for atLeast, then 0.3 s. */
-        List<String> calls(String program, int atLeast) throws InterruptedException {
-            Path record = root.resolve("calls").resolve(program);
-            for (int i = 0; i < 500 && lines(record).size() < atLeast; i++) {
+        List<String> calls(String program, int atLeast) throws Exception {
+            Path record = root.resolve("calls-" + program);
+            for (int i = 0; i < 500 && Objects.toString(read(record), "").lines().count() < atLeast;
+                 i++) {
                 Thread.sleep(20);
             }
             Thread.sleep(300);
-            return lines(record);
-        }
-
-        List<String> values(String key) {
-            return stdout.lines().filter(line -> line.startsWith(key + "="))
-                .map(line -> line.substring(key.length() + 1)).collect(Collectors.toList());
+            return Objects.toString(read(record), "").lines().toList();
         }
 
         @Override

@@ -2,7 +2,6 @@ package com.korvane.sysmgt.tarnova.agent.e2e;
 
 import static org.junit.jupiter.api.Assertions.*;
 
-import com.google.gson.*;
 import java.nio.file.*;
 import java.util.*;
 import java.util.stream.Stream;
@@ -20,17 +19,16 @@ class CaptureTest {
         List<String> command = new ArrayList<>(List.of(simulator));
         Path machines = Path.of(AgentHarness.property("velh.machines.dir"));
         command.addAll(List.of(machines.resolveSibling("capture").toString(), folder.toString()));
-        Path out = temp.resolve("capture.out");
-        ProcessBuilder builder = new ProcessBuilder(command).directory(temp.toFile())
-            .redirectErrorStream(true).redirectOutput(out.toFile());
+        ProcessBuilder builder = new ProcessBuilder(command).directory(temp.toFile()).inheritIO();
         builder.environment().put("VELHSIM_BUILD_DIR", buildDir);
-        assertEquals(0, builder.start().waitFor(), Files.readString(out));
+        assertEquals(0, builder.start().waitFor(), command::toString);
     }
 
-    private JsonObject json(Path machine) {
+    /** The agent's document on the machine. */
+    private String json(Path machine) {
         AgentHarness.Result result = new AgentHarness(temp).onMachine(machine).agent("--json");
         assertEquals(0, result.exitCode(), result::toString);
-        return result.document();
+        return result.stdout();
     }
 
     @Test

@@ -2,8 +2,7 @@ package com.korvane.sysmgt.tarnova.agent.e2e;
 
 import com.korvane.sysmgt.tarnova.agent.TarnovaAgent;
 import com.korvane.sysmgt.tarnova.agent.cli.*;
-import java.util.stream.Collectors;
-import java.util.stream.Stream;
+import java.util.stream.*;
 
 /**
  * Runs in the child JVM: calls the entry points its arguments name, in order (debug, hwinfo,
