@@ -12,26 +12,22 @@
 
 namespace {
 
-std::string Narrow(const std::wstring& text) {
-    return std::string(text.begin(), text.end());
-}
-
 // A line per adapter, in list order; -1 for none.
 std::string Describe(ObjListTemp<AdapterDescriptor>& list) {
-    std::string described;
+    std::wstring described;
     list.BeginEnumeration();
     while (AdapterDescriptor* a = list.Next()) {
-        described += Narrow(a->Name);
+        described += a->Name;
         for (uint32_t value :
              {a->AdapterID, a->SlotID, a->FriendlyNum, a->BusID, a->Bus, a->Device, a->Function,
               a->MaxSpeed, a->PowerReq, a->Width, uint32_t(a->HasBridge), uint32_t(a->IsBootDev),
               uint32_t(a->SupPciX), uint32_t(a->OnBoard), uint32_t(a->ModuleName != nullptr),
               uint32_t(a->ConfigSpace[0])}) {
-            described += "|" + std::to_string(int32_t(value));
+            described += L"|" + std::to_wstring(int32_t(value));
         }
-        described += "|" + Narrow(a->PciId) + "|" + Narrow(a->Driver) + "\n";
+        described += L"|" + a->PciId + L"|" + a->Driver + L"\n";
     }
-    return described;
+    return std::string(described.begin(), described.end());
 }
 
 class CardFileTest : public ::testing::Test {

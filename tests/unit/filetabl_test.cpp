@@ -17,9 +17,8 @@ namespace {
 using Bytes = std::vector<uint8_t>;
 
 struct Table {
-    uint32_t Count = 0;
-    uint32_t End = 0;  // bytes the packet occupies
-    Bytes Buffer;      // the whole buffer after the read
+    uint32_t Count = 0, End = 0;  // End: bytes the packet occupies
+    Bytes Buffer;                 // the whole buffer after the read
     Bytes Range(size_t from, size_t to) const {
         return Bytes(Buffer.data() + from, Buffer.data() + to);
     }

@@ -15,9 +15,7 @@ namespace {
 _VPD_LAYOUT Record(const char* typeModel) {
     _VPD_LAYOUT record;
     std::memset(&record, 0x20, sizeof(record));
-    record.Header1 = 0xAA;
-    record.Header2 = 0x55;
-    std::memcpy(record.Signature, "VPD", 3);
+    std::memcpy(&record, "\xAA\x55VPD", 5);  // the two header bytes and the signature
     record.VpdLength = 48;
     std::memcpy(record.MachineTypeModel, typeModel, 7);
     record.Checksum = 0x5A;
