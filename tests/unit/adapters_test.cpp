@@ -78,8 +78,7 @@ TEST(CapabilityWalk, ReadsKnownItemsWithinTheImageAndDerivesPciX) {
 
 TEST(ProcBusPci, BusFoldersAndFunctionFiles) {
     _FILE_ATTRIBS entry{};
-    uint32_t device = 0;
-    uint32_t function = 0;
+    uint32_t device = 0, function = 0;
     for (auto [name, bus] :
          {std::pair{"1f", 0x1f}, {"0000:00", 0}, {"0000:0a", 10}, {"0000:zz", -1}, {"x1", -1}}) {
         std::strcpy(entry.EntryName, name);
