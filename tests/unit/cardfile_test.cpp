@@ -53,8 +53,7 @@ class CardFileTest : public ::testing::Test {
     InstallTree Tree;
 };
 
-// Every read gives the file's adapters and error blocks afresh; declared adapters replace or
-// join the found ones, and each list destroys its own descriptors.
+// Declared adapters replace or join the found ones; each list destroys its own descriptors.
 TEST_F(CardFileTest, EveryReadGivesTheFilesAdaptersAndDeclaredOnesReplaceOrJoinOver50Reads) {
     for (int round = 0; round < 50; ++round) {
         EXPECT_EQ(Read("fields"), 12);

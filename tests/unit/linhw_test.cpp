@@ -53,34 +53,29 @@ TEST_F(SlotDriverTest, DriverVersionTextIsCutToItsBuffer) {
     EXPECT_EQ(Tree.Log(), "");
 }
 
-TEST_F(SlotDriverTest, ReadsTheTableInTwoSteps) {
-    HwInfoPrintLevel = RAW_ASL;
-    Fake.SetTable(1234);
-    EXPECT_EQ(GetAslTable(Packet.get()), 1234u);
-    EXPECT_EQ(Tree.Log(),
-              "\nvelhlib, GetAslTable():  Calling VelhSlot driver\n\n"
-              "\nGetAslTable(), buffer size: 80016\n"
-              "GetAslTable(), got 1234 bytes from driver\n\n");
-}
-
-TEST_F(SlotDriverTest, TableSizesOutsideTheBufferAreRefusedOrCut) {
+TEST_F(SlotDriverTest, ReadsTheTableInTwoStepsAndRefusesOrCutsWhatTheBufferCannotHold) {
     const std::string head = "\nVELHLIB, GetAslTable():  ";
     const unsigned long asked[] = {VELH_IOCTL_TABLE_SIZE, VELH_IOCTL_TABLE};
-    // Table size, size the driver answers after the transfer (0: the buffer's), bytes taken, log.
+    // Table size, size the driver answers after the transfer (0: the buffer's), bytes taken,
+    // trace level, log.
     const struct {
-        uint32_t Size, Delivered, Taken;
+        uint32_t Size, Delivered, Taken, Level;
         std::string Log;
     } cases[] = {
+        {1234, 0, 1234, RAW_ASL,
+         "\nvelhlib, GetAslTable():  Calling VelhSlot driver\n\n\nGetAslTable(), buffer size: 80016"
+         "\nGetAslTable(), got 1234 bytes from driver\n\n"},
         // A table larger than the buffer is refused before it is asked for; size 0 is none.
-        {ASL_PACKET_CAPACITY + 1, 0, 0,
+        {ASL_PACKET_CAPACITY + 1, 0, 0, 0,
          head + "Table of 80017 bytes does not fit the 80016-byte buffer\n"},
-        {0, 0, 0, ""},
-        {ASL_PACKET_CAPACITY, 0, ASL_PACKET_CAPACITY, ""},
-        {100, 5000, 100,
+        {0, 0, 0, 0, ""},
+        {ASL_PACKET_CAPACITY, 0, ASL_PACKET_CAPACITY, 0, ""},
+        {100, 5000, 100, 0,
          head + "Driver delivered 5000 bytes into a buffer of 100; the table is cut\n"},
-        {100, 60, 60, ""},  // a driver answering less the second time hands over only that much
+        {100, 60, 60, 0, ""},  // a driver answering less the second time hands over only that much
     };
     for (const auto& c : cases) {
+        HwInfoPrintLevel = c.Level;
         const size_t logged = Tree.Log().size();
         Fake.Requests.clear();
         Fake.SetTable(c.Size);

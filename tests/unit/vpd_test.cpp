@@ -65,8 +65,7 @@ TEST_F(VpdTest, TakesTheRecordAtTheLowestOffsetThatFitsWhollyInTheSegmentAndKeep
     Put(VPD_SEGMENT_SIZE - sizeof(_VPD_LAYOUT), &last);  // exactly the last place that fits
     Expect(&last);
 
-    const _VPD_LAYOUT low = Record("K740AAA");
-    const _VPD_LAYOUT high = Record("K740BBB");
+    const _VPD_LAYOUT low = Record("K740AAA"), high = Record("K740BBB");
     Put(0x1234, &low);
     Put(0x8000, &high);
     // Header bytes followed by another signature are no record.
