@@ -54,9 +54,8 @@ TEST(DescriptorSize, SizesByTypeWithBitSevenForcedAndNeverReadsPastTheAvailableB
     InstallTree tree;
     // Bytes, available, size. 0x20 with bit 7 forced reads as the end marker.
     const uint32_t past = ASL_SIZE_PAST_END;
-    using Bytes = std::vector<uint8_t>;
-    using Case = std::tuple<Bytes, uint32_t, uint32_t>;
-    const Bytes string{0x91, 4, 'a', 'b', 'c', 0}, header{'V', 'H', 'S', 'L', 16};
+    using Case = std::tuple<std::vector<uint8_t>, uint32_t, uint32_t>;
+    const std::vector<uint8_t> string{0x91, 4, 'a', 'b', 'c', 0}, header{'V', 'H', 'S', 'L', 16};
     const Case cases[] = {Case({0x81, 20, 0}, 3, 20), Case({0x02, 16}, 2, 16),
                           Case(header, 5, 16),        Case({0x91, 4, 'a', 'b', 'c', 0, 0x55}, 7, 6),
                           Case(string, 6, 6),         Case({0x11, 4, 0}, 3, 3),
