@@ -17,9 +17,8 @@ namespace {
 using Bytes = std::vector<uint8_t>;
 
 struct Table {
-    uint32_t Count = 0;
-    uint32_t End = 0;  // bytes the packet occupies
-    Bytes Buffer;      // the whole buffer after the read
+    uint32_t Count = 0, End = 0;  // End: bytes the packet occupies
+    Bytes Buffer;                 // the whole buffer after the read
     Bytes Range(size_t from, size_t to) const {
         return Bytes(Buffer.data() + from, Buffer.data() + to);
     }
@@ -44,30 +43,25 @@ Table Read(const std::string& text, uint32_t size = ASL_PACKET_CAPACITY) {
 
 // A packet whose file had no header line: the header is all zeros.
 AslBuilder Headless() {
-    AslBuilder packet;
-    packet.Bytes.assign(16, 0);
-    return packet;
+    return AslBuilder().Raw({0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0});
 }
 
-class FileTableTest : public ::testing::Test {
-  protected:
-    InstallTree Tree;  // the reader's messages land in its log
-};
-
-TEST_F(FileTableTest, LinesBecomeDescriptors) {
-    const std::string unknownSection = "\nParseLine(): unknown parse mode 0\n\n";
+TEST(FileTable, LinesBecomeDescriptorsUpToTheBufferSize) {
+    InstallTree tree;  // the reader's messages land in its log
+    // Logged for a line outside a known section.
+    const std::string unknown = "\nParseLine(): unknown parse mode 0\n\n";
     const struct {
         std::string Text;
         AslBuilder Expected;
         uint32_t Count;
-        int UnknownLines;  // lines outside a known section, each reported
+        std::string Log;
     } cases[] = {
         {"// sample machine\n[table header]\nVHSL 1 0 MACH01\n\n[chassis]\n0 1\n[string]\n"
          "1 \"Twelve chars\"   // the chassis name\n",
-         AslBuilder().Header("MACH01").Chassis(0, 1).String(1, "Twelve chars").End(), 48, 0},
+         AslBuilder().Header("MACH01").Chassis(0, 1).String(1, "Twelve chars").End(), 48, ""},
         // No lines: the signature the buffer held before is gone, it cannot pass for a table.
-        {"", Headless().End(), 1, 0},
-        {"// only\n   // comments\n\n", Headless().End(), 1, 0},
+        {"", Headless().End(), 1, ""},
+        {"// only\n   // comments\n\n", Headless().End(), 1, ""},
         // Section lines are matched whole after cutting comments and case.
         {"[Table Header]\nVHSL 1 0 M\n[BUS] // busses follow\n1\n[slot]\n7 1\n  [Bus]\n2\n"
          "[busses]\n3\n[ bus ]\n4\n[table  header]\n5\n[drawer]\n9 4\n",
@@ -78,9 +72,9 @@ TEST_F(FileTableTest, LinesBecomeDescriptors) {
              .Bus({2, 0, 0})
              .Drawer(9, 4)
              .End(),
-         16 + 4 * 16 + 1, 3},
-        {"1 2 3\n[bus]\n4\n", Headless().Bus({4, 0, 0}).End(), 17, 1},
-        {"[bus]\n5", Headless().Bus({5, 0, 0}).End(), 17, 0},  // a last line without line feed
+         16 + 4 * 16 + 1, unknown + unknown + unknown},
+        {"1 2 3\n[bus]\n4\n", Headless().Bus({4, 0, 0}).End(), 17, unknown},
+        {"[bus]\n5", Headless().Bus({5, 0, 0}).End(), 17, ""},  // a last line without line feed
         // Numbers are cut to their field widths; missing ones are zero, and a short line reads
         // nothing of the longer line before it that lies past its end in the buffer.
         {"[bus]\n1 2 255 0X1F 4 5 6 7 8 9 10 11 12 13\n1 2 3 256 0x101 0 0 0 0 0 0 0x1ff\n5 1\n"
@@ -93,35 +87,29 @@ TEST_F(FileTableTest, LinesBecomeDescriptors) {
              .Slot({70000 & 0xFFFF, 1, 255, 0})
              .Chassis(4, 0)
              .End(),
-         6 * 16 + 1, 0},
+         6 * 16 + 1, ""},
         // Header texts are cut or padded, and a repeated header rewrites the first.
         {"[table header]\nVHSLX 2 3 ABCDEFGH\n[bus]\n1\n[table header]\nVHSL 4 5 AB\n",
          AslBuilder()
              .Raw({'V', 'H', 'S', 'L', 16, 4, 5, 'A', 'B', 0, 0, 0, 0, 0, 0, 0})
              .Bus({1, 0, 0})
              .End(),
-         16 + 16 + 16 + 1, 0},
+         16 + 16 + 16 + 1, ""},
         {"[table header]\nVH\n",
-         AslBuilder().Raw({'V', 'H', 0, 0, 16, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0}).End(), 17, 0},
+         AslBuilder().Raw({'V', 'H', 0, 0, 16, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0}).End(), 17, ""},
         // A text is quoted or ends at the first blank.
         {"[string]\n1 two words\n0x102 \"two  words\" ignored\n3\n",
-         Headless().String(1, "two").String(2, "two  words").String(3, "").End(), 6 + 13 + 3 + 1,
-         0},
+         Headless().String(1, "two").String(2, "two  words").String(3, "").End(), 23, ""},
     };
     for (const auto& c : cases) {
-        const size_t logged = Tree.Log().size();
+        const size_t logged = tree.Log().size();
         const Table table = Read(c.Text);
         EXPECT_EQ(table.Packet(), c.Expected.Bytes) << c.Text;
         EXPECT_EQ(table.Count, c.Count) << c.Text;
-        std::string log;
-        for (int i = 0; i < c.UnknownLines; i++) {
-            log += unknownSection;
-        }
-        EXPECT_EQ(Tree.Log().substr(logged), log) << c.Text;
+        EXPECT_EQ(tree.Log().substr(logged), c.Log) << c.Text;
     }
-}
 
-TEST_F(FileTableTest, AnOversizedFileStopsAtTheLastDescriptorThatFits) {
+    // An oversized file stops at the last descriptor that fits.
     std::string text = "[table header]\nVHSL 1 0 BIG\n[bus]\n";
     for (int i = 0; i < 6000; i++) {
         text += std::to_string(i % 256) + "\n";
@@ -132,8 +120,8 @@ TEST_F(FileTableTest, AnOversizedFileStopsAtTheLastDescriptorThatFits) {
     EXPECT_EQ(full.Count, full.End);
     EXPECT_EQ(full.Range(full.End - 17, full.End),
               AslBuilder().Bus({4998 % 256, 0, 0}).End().Bytes);
-    EXPECT_TRUE(Tree.Logged("ReadFileTable():  Table exceeds the packet buffer of 80016 bytes"))
-        << Tree.Log();
+    EXPECT_TRUE(tree.Logged("ReadFileTable():  Table exceeds the packet buffer of 80016 bytes"))
+        << tree.Log();
 
     // A smaller buffer: nothing beyond it is written, not even by a string that would not fit.
     const Table small =

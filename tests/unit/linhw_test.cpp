@@ -28,7 +28,6 @@ class SlotDriverTest : public ::testing::Test {
     void SetUp() override {
         Fake.Install();
         SysPaths().SlotDriver = Tree.Scratch().Write("velhpdrv", "");
-        std::memset(Packet.get(), 0xEE, sizeof(_ASL_PACKET));
         Descriptors = OpenDescriptors();
     }
     void TearDown() override {
@@ -36,15 +35,6 @@ class SlotDriverTest : public ::testing::Test {
         EXPECT_EQ(OpenDescriptors(), Descriptors);
         ResetSystemAccess();
         HwInfoPrintLevel = 0;
-    }
-
-    // The table's first `size` bytes are in the packet, and nothing after them.
-    void ExpectTable(uint32_t size) const {
-        const auto* bytes = reinterpret_cast<const uint8_t*>(Packet.get());
-        EXPECT_EQ(std::memcmp(bytes, Fake.Table.data(), size), 0);
-        for (size_t i = size; i < sizeof(_ASL_PACKET); ++i) {
-            ASSERT_EQ(bytes[i], 0xEE) << i;
-        }
     }
 
     InstallTree Tree;
@@ -55,60 +45,48 @@ class SlotDriverTest : public ::testing::Test {
 
 }  // namespace
 
-TEST_F(SlotDriverTest, DriverVersionText) {
-    Fake.Version = {1, 2, 3};
-    char* first = GetDriverVersion();
-    ASSERT_NE(first, nullptr);
-    EXPECT_STREQ(first, "1.2.3");
+// "1.0.0" is linsetup_test's; three numbers of eleven characters each are cut to the buffer's 31.
+TEST_F(SlotDriverTest, DriverVersionTextIsCutToItsBuffer) {
+    Fake.Version = {INT32_MIN, -2147483647, -1999999999};
+    EXPECT_STREQ(GetDriverVersion(), "-2147483648.-2147483647.-199999");
     EXPECT_EQ(Fake.Requests, (std::vector<unsigned long>{VELH_IOCTL_VERSION}));
-    // Three numbers of eleven characters each are cut to the buffer's 31.
-    Fake.Version = {INT32_MIN, INT32_MIN, INT32_MIN};
-    EXPECT_EQ(GetDriverVersion(), first);
-    EXPECT_STREQ(first, "-2147483648.-2147483648.-214748");
     EXPECT_EQ(Tree.Log(), "");
 }
 
-TEST_F(SlotDriverTest, ReadsTheTableInTwoSteps) {
-    HwInfoPrintLevel = RAW_ASL;
-    Fake.SetTable(1234);
-    EXPECT_EQ(GetAslTable(Packet.get()), 1234u);
-    ExpectTable(1234);
-    EXPECT_EQ(Fake.Requests, (std::vector<unsigned long>{VELH_IOCTL_TABLE_SIZE, VELH_IOCTL_TABLE}));
-    EXPECT_EQ(Tree.Log(),
-              "\nvelhlib, GetAslTable():  Calling VelhSlot driver\n\n"
-              "\nGetAslTable(), buffer size: 80016\n"
-              "GetAslTable(), got 1234 bytes from driver\n\n");
-}
-
-TEST_F(SlotDriverTest, TableSizesOutsideTheBuffer) {
-    // A table larger than the packet buffer is refused before it is asked for; size 0 is none.
-    for (uint32_t size : {ASL_PACKET_CAPACITY + 1, 0u}) {
+TEST_F(SlotDriverTest, ReadsTheTableInTwoStepsAndRefusesOrCutsWhatTheBufferCannotHold) {
+    const std::string head = "\nVELHLIB, GetAslTable():  ";
+    const unsigned long asked[] = {VELH_IOCTL_TABLE_SIZE, VELH_IOCTL_TABLE};
+    // Table size, size the driver answers after the transfer (0: the buffer's), bytes taken,
+    // trace level, log.
+    const struct {
+        uint32_t Size, Delivered, Taken, Level;
+        std::string Log;
+    } cases[] = {
+        {1234, 0, 1234, RAW_ASL,
+         "\nvelhlib, GetAslTable():  Calling VelhSlot driver\n\n\nGetAslTable(), buffer size: 80016"
+         "\nGetAslTable(), got 1234 bytes from driver\n\n"},
+        // A table larger than the buffer is refused before it is asked for; size 0 is none.
+        {ASL_PACKET_CAPACITY + 1, 0, 0, 0,
+         head + "Table of 80017 bytes does not fit the 80016-byte buffer\n"},
+        {0, 0, 0, 0, ""},
+        {ASL_PACKET_CAPACITY, 0, ASL_PACKET_CAPACITY, 0, ""},
+        {100, 5000, 100, 0,
+         head + "Driver delivered 5000 bytes into a buffer of 100; the table is cut\n"},
+        {100, 60, 60, 0, ""},  // a driver answering less the second time hands over only that much
+    };
+    for (const auto& c : cases) {
+        HwInfoPrintLevel = c.Level;
+        const size_t logged = Tree.Log().size();
         Fake.Requests.clear();
-        Fake.SetTable(size);
-        EXPECT_EQ(GetAslTable(Packet.get()), 0u);
-        EXPECT_EQ(Fake.Requests, (std::vector<unsigned long>{VELH_IOCTL_TABLE_SIZE}));
-        ExpectTable(0);
+        Fake.SetTable(c.Size);
+        Fake.DeliveredSize = c.Delivered;
+        std::memset(Packet.get(), 0xEE, sizeof(_ASL_PACKET));
+        EXPECT_EQ(GetAslTable(Packet.get()), c.Taken) << c.Size;
+        // The table's first bytes are in the packet, and nothing after them.
+        std::vector<uint8_t> expected(Fake.Table.begin(), Fake.Table.begin() + c.Taken);
+        expected.resize(sizeof(_ASL_PACKET), 0xEE);
+        EXPECT_EQ(std::memcmp(Packet.get(), expected.data(), expected.size()), 0) << c.Size;
+        EXPECT_EQ(Fake.Requests, std::vector(asked, asked + (c.Taken == 0 ? 1 : 2))) << c.Size;
+        EXPECT_EQ(Tree.Log().substr(logged), c.Log);
     }
-    EXPECT_EQ(Tree.Log(),
-              "\nVELHLIB, GetAslTable():  Table of 80017 bytes does not fit the 80016-byte "
-              "buffer\n");
-    // A table of the full capacity fits.
-    Fake.SetTable(ASL_PACKET_CAPACITY);
-    EXPECT_EQ(GetAslTable(Packet.get()), ASL_PACKET_CAPACITY);
-}
-
-TEST_F(SlotDriverTest, DriverChangingTheSizeCannotOverrun) {
-    Fake.SetTable(100);
-    Fake.DeliveredSize = 5000;
-    EXPECT_EQ(GetAslTable(Packet.get()), 100u);
-    ExpectTable(100);
-    EXPECT_EQ(Tree.Log(),
-              "\nVELHLIB, GetAslTable():  Driver delivered 5000 bytes into a buffer of 100; the "
-              "table is cut\n");
-
-    // A driver answering less the second time hands over only that much.
-    Fake.DeliveredSize = 60;
-    std::memset(Packet.get(), 0xEE, sizeof(_ASL_PACKET));
-    EXPECT_EQ(GetAslTable(Packet.get()), 60u);
-    ExpectTable(60);
 }

@@ -15,9 +15,7 @@ namespace {
 _VPD_LAYOUT Record(const char* typeModel) {
     _VPD_LAYOUT record;
     std::memset(&record, 0x20, sizeof(record));
-    record.Header1 = 0xAA;
-    record.Header2 = 0x55;
-    std::memcpy(record.Signature, "VPD", 3);
+    std::memcpy(&record, "\xAA\x55VPD", 5);  // the two header bytes and the signature
     record.VpdLength = 48;
     std::memcpy(record.MachineTypeModel, typeModel, 7);
     record.Checksum = 0x5A;
@@ -45,48 +43,43 @@ class VpdTest : public ::testing::Test {
         ASSERT_EQ(std::fseek(image.get(), VPD_SEGMENT_OFFSET + offset, SEEK_SET), 0);
         ASSERT_EQ(std::fwrite(bytes, 1, length, image.get()), length);
     }
-    void Expect(bool found, const _VPD_LAYOUT& record) {
-        _VPD_LAYOUT out;
+    // GetVPD finds `record`, or with nullptr none and leaves its output untouched.
+    void Expect(const _VPD_LAYOUT* record) {
+        _VPD_LAYOUT out, untouched;
         std::memset(&out, 0x11, sizeof(out));
-        EXPECT_EQ(GetVPD(&out), found);
-        EXPECT_EQ(ValidVPD, found);
-        EXPECT_EQ(std::memcmp(&out, &record, sizeof(out)), 0);  // else untouched
+        std::memset(&untouched, 0x11, sizeof(untouched));
+        EXPECT_EQ(GetVPD(&out), record != nullptr);
+        EXPECT_EQ(ValidVPD, record != nullptr);
+        EXPECT_EQ(std::memcmp(&out, record != nullptr ? record : &untouched, sizeof(out)), 0);
     }
     InstallTree Tree;
     std::string Image;
 };
 
-TEST_F(VpdTest, TakesTheRecordAtTheLowestOffsetThatFitsWhollyInTheSegment) {
-    _VPD_LAYOUT untouched;
-    std::memset(&untouched, 0x11, sizeof(untouched));
-    Expect(false, untouched);
-    EXPECT_EQ(Tree.Log(), "");  // no message for a missing record
+TEST_F(VpdTest, TakesTheRecordAtTheLowestOffsetThatFitsWhollyInTheSegmentAndKeepsIt) {
+    Expect(nullptr);
 
     const _VPD_LAYOUT last = Record("1234XYZ");
     Put(VPD_SEGMENT_SIZE - sizeof(_VPD_LAYOUT) + 1, &last);  // its last byte would lie outside
-    Expect(false, untouched);
+    Expect(nullptr);
     Put(VPD_SEGMENT_SIZE - sizeof(_VPD_LAYOUT), &last);  // exactly the last place that fits
-    Expect(true, last);
+    Expect(&last);
 
-    const _VPD_LAYOUT low = Record("K740AAA");
-    const _VPD_LAYOUT high = Record("K740BBB");
+    const _VPD_LAYOUT low = Record("K740AAA"), high = Record("K740BBB");
     Put(0x1234, &low);
     Put(0x8000, &high);
     // Header bytes followed by another signature are no record.
     Put(0x0100, "\xAA\x55VPX", 5);
     Put(0x0200, "\xAA\x54VPD", 5);
-    Expect(true, low);
-    EXPECT_EQ(Tree.Log(), "");
-}
+    Expect(&low);
+    EXPECT_EQ(Tree.Log(), "");  // no message for a missing record
 
-TEST_F(VpdTest, AFoundRecordStaysWhenALaterSearchFails) {
-    const _VPD_LAYOUT record = Record("7890ABC");
-    Put(0x40, &record);
+    // A found record stays when a later search fails.
     ASSERT_TRUE(GetVPD(&Vpd));
     SysPaths().DevMem = Tree.Scratch().Path("missing");
     EXPECT_FALSE(GetVPD(&Vpd));
     EXPECT_TRUE(ValidVPD);
-    EXPECT_EQ(std::memcmp(&Vpd, &record, sizeof(Vpd)), 0);
+    EXPECT_EQ(std::memcmp(&Vpd, &low, sizeof(Vpd)), 0);
     EXPECT_TRUE(Tree.Logged("GetVPD():  error opening memory file " + SysPaths().DevMem))
         << Tree.Log();
 
@@ -94,10 +87,8 @@ TEST_F(VpdTest, AFoundRecordStaysWhenALaterSearchFails) {
     ValidVPD = false;
     SysPaths().DevMem = Image;
     ASSERT_EQ(truncate(Image.c_str(), VPD_SEGMENT_OFFSET + 100), 0);
-    Put(0, &record);
-    _VPD_LAYOUT out;
-    EXPECT_FALSE(GetVPD(&out));
-    EXPECT_FALSE(ValidVPD);
+    Put(0, &low);
+    Expect(nullptr);
     EXPECT_TRUE(Tree.Logged("GetVPD():  read failed, got 100 bytes")) << Tree.Log();
 }
 
