@@ -24,11 +24,10 @@ Names Walk(EnumDir& walker) {
     return names;
 }
 
-TEST(EnumDir, WalksSortedEntriesOfTheRequestedTypesAndPatterns) {
+TEST(EnumDir, WalksSortedEntriesOfTheRequestedTypesAndPatternsAndStops) {
     InstallTree tree;
     const ScratchDir& dir = tree.Scratch();
-    ASSERT_EQ(mkdir(dir.Path("w").c_str(), 0700), 0);
-    for (const char* name : {"w/0a", "w/01", "w/00"}) {
+    for (const char* name : {"w", "w/0a", "w/01", "w/00"}) {
         ASSERT_EQ(mkdir(dir.Path(name).c_str(), 0700), 0);
     }
     for (const char* name : {"w/0b", "w/SuSE-release", "w/UnitedLinux-release", "w/.hidden"}) {
@@ -62,60 +61,44 @@ TEST(EnumDir, WalksSortedEntriesOfTheRequestedTypesAndPatterns) {
         EnumDir walker(directory.c_str(), pattern, mask);
         EXPECT_EQ(Walk(walker), names) << (pattern ? pattern : "") << mask;
     }
-    // The record: type bits, size, times and a path with one slash, with or without a trailing
-    // slash on the directory text.
+    // Nothing started; later arguments are ignored: the walk goes on in the first directory. The
+    // record: type bits, size, times and a path with one slash, with or without a trailing slash.
+    _FILE_ATTRIBS attribs;
     for (const std::string& directory : {w, w + "/"}) {
-        EnumDir walker(directory.c_str(), "dev*", ATTR_FILE);
-        _FILE_ATTRIBS attribs;
-        ASSERT_TRUE(walker.Next(&attribs));
+        EnumDir walker;
+        EXPECT_FALSE(walker.Next(&attribs));
+        ASSERT_TRUE(walker.Next(directory.c_str(), "[0d]*", ATTR_FILE, &attribs));
+        EXPECT_STREQ(attribs.EntryName, "0b");
+        ASSERT_TRUE(walker.Next("/nonexistent", "x", ATTR_SOCKET, &attribs));
+        EXPECT_STREQ(attribs.EntryName, "devices");
         EXPECT_EQ(attribs.Attribs, ATTR_FILE);
         EXPECT_EQ(attribs.Size, 5u);
         EXPECT_GT(attribs.WriteTime, 0);
         EXPECT_GT(attribs.AccessTime, 0);
         EXPECT_STREQ(attribs.EntryPath, path.c_str());
+        errno = 0;
         EXPECT_FALSE(walker.Next(&attribs));
+        EXPECT_EQ(errno, ENOENT);
+        EXPECT_STREQ(attribs.EntryName, "devices");  // untouched at the end
+        EXPECT_FALSE(walker.Next(&attribs));
+        EXPECT_TRUE(walker.Rewind());
+        EXPECT_EQ(Walk(walker), (Names{"0b", "devices"}));
+        EXPECT_TRUE(walker.Reset());
+        EXPECT_FALSE(walker.Next(&attribs));
+        ASSERT_TRUE(walker.Next(directory.c_str(), "*", ATTR_DIRECTORY, &attribs));
+        EXPECT_STREQ(attribs.EntryName, "00");
     }
-
-    // An entry that vanishes during the walk is reported and skipped.
-    EnumDir walker(w.c_str(), "0*", ATTR_DIRECTORY | ATTR_FILE);
-    ASSERT_EQ(rmdir(dir.Path("w/01").c_str()), 0);
-    EXPECT_EQ(Walk(walker), (Names{"00", "0a", "0b"}));
-    EXPECT_TRUE(tree.Logged("EnumDir::SetAttribs():  lstat64() failed for " + w + "/01"))
-        << tree.Log();
-}
-
-TEST(EnumDir, EndRewindResetAndMissingDirectories) {
-    ScratchDir dir;
-    dir.Write("0b", "");
-    dir.Write("devices", "");
-    ASSERT_EQ(mkdir(dir.Path("00").c_str(), 0700), 0);
-    EnumDir walker;
-    _FILE_ATTRIBS attribs;
-    EXPECT_FALSE(walker.Next(&attribs));  // nothing started
-    ASSERT_TRUE(walker.Next(dir.Path().c_str(), "*", ATTR_FILE, &attribs));
-    EXPECT_STREQ(attribs.EntryName, "0b");
-    // Later arguments are ignored: the walk goes on in the first directory.
-    ASSERT_TRUE(walker.Next("/nonexistent", "x", ATTR_SOCKET, &attribs));
-    EXPECT_STREQ(attribs.EntryName, "devices");
-    errno = 0;
-    EXPECT_FALSE(walker.Next(&attribs));
-    EXPECT_EQ(errno, ENOENT);
-    EXPECT_STREQ(attribs.EntryName, "devices");  // untouched at the end
-    EXPECT_FALSE(walker.Next(&attribs));
-
-    EXPECT_TRUE(walker.Rewind());
-    ASSERT_TRUE(walker.Next(&attribs));
-    EXPECT_STREQ(attribs.EntryName, "0b");
-    EXPECT_TRUE(walker.Reset());
-    EXPECT_FALSE(walker.Next(&attribs));
-    ASSERT_TRUE(walker.Next(dir.Path().c_str(), "*", ATTR_DIRECTORY, &attribs));
-    EXPECT_STREQ(attribs.EntryName, "00");
-
     // A missing directory: the first call fails and so does every later one, without retrying.
     EnumDir missing;
     EXPECT_FALSE(missing.StartEnum(dir.Path("gone").c_str(), "*", ATTR_FILE));
-    EXPECT_FALSE(missing.Next(dir.Path().c_str(), "*", ATTR_FILE, &attribs));
+    EXPECT_FALSE(missing.Next(w.c_str(), "*", ATTR_FILE, &attribs));
     EXPECT_FALSE(missing.Next(&attribs));
+    // An entry that vanishes during the walk is reported and skipped.
+    EnumDir vanishing(w.c_str(), "0*", ATTR_DIRECTORY | ATTR_FILE);
+    ASSERT_EQ(rmdir(dir.Path("w/01").c_str()), 0);
+    EXPECT_EQ(Walk(vanishing), (Names{"00", "0a", "0b"}));
+    EXPECT_TRUE(tree.Logged("EnumDir::SetAttribs():  lstat64() failed for " + w + "/01"))
+        << tree.Log();
 }
 
 }  // namespace

@@ -26,9 +26,12 @@ int RawQueryModule(const char*, int, void* buffer, size_t size, size_t* ret) {
     return 0;
 }
 
-void PutEntry(size_t index, unsigned long value, unsigned long name) {
-    module_symbol entry{value, name};
-    std::memcpy(RawImage.data() + index * sizeof(entry), &entry, sizeof(entry));
+// Entries of (value, offset of the name), then the names; the kernel claims count entries.
+void SetRaw(std::vector<module_symbol> entries, const std::string& names, size_t count) {
+    const char* start = reinterpret_cast<const char*>(entries.data());
+    RawImage.assign(start, start + entries.size() * sizeof(module_symbol));
+    RawImage.insert(RawImage.end(), names.begin(), names.end());
+    RawCount = count;
 }
 
 class ModQuery : public ::testing::Test {
@@ -53,9 +56,7 @@ TEST_F(ModQuery, SymbolListOfALoadedModule) {
     EXPECT_STREQ(list.Name(1), "e1000_remove");
     EXPECT_EQ(list.Name(2), nullptr);
     EXPECT_EQ(list.Name(-1), nullptr);
-
     // Not loaded, or loaded without symbols: nothing handed out.
-    EXPECT_EQ(SizeBuffer("e100", QM_SYMBOLS), 0);
     for (const char* module : {"e100", "bare"}) {
         EXPECT_EQ(GetModuleSymbols(module, &list), 0);
         EXPECT_EQ(list.Buffer, nullptr);
@@ -68,33 +69,24 @@ TEST_F(ModQuery, SymbolListOfALoadedModule) {
 
 TEST_F(ModQuery, MalformedSymbolListsAreReadOnlyInsideTheBuffer) {
     SysCalls().QueryModule = RawQueryModule;
-    // Three entries' worth of names after two entries: one good, one pointing past the end,
-    // one pointing back into the entries, and a count claiming more entries than fit.
-    RawImage.assign(2 * sizeof(module_symbol), '\0');
-    const size_t good = RawImage.size();
-    RawImage.insert(RawImage.end(), {'o', 'k', '\0'});
-    PutEntry(0, 1, good);
-    PutEntry(1, 2, RawImage.size() + 5);
-    RawCount = 1000;
+    // One name after two entries: one pointing at it, one past the end, then one into the
+    // entries; and a count claiming more entries than fit.
+    const unsigned long good = 2 * sizeof(module_symbol);
+    const std::string ok("ok", 3);
     ModuleSymbols list;
+    SetRaw({{1, good}, {2, good + 8}}, ok, 1000);
     ASSERT_EQ(GetModuleSymbols("raw", &list), 2);
     EXPECT_STREQ(list.Name(0), "ok");
     EXPECT_EQ(list.Name(1), nullptr);
-
-    PutEntry(1, 2, 3);  // inside the entry array
-    RawCount = 2;
+    SetRaw({{1, good}, {2, 3}}, ok, 2);
     ASSERT_EQ(GetModuleSymbols("raw", &list), 2);
     EXPECT_EQ(list.Name(1), nullptr);
-
     // A last name that runs to the end of the buffer without its terminator.
-    RawImage.pop_back();
-    PutEntry(1, 2, good);
+    SetRaw({{1, good}, {2, good}}, "ok", 2);
     ASSERT_EQ(GetModuleSymbols("raw", &list), 2);
     EXPECT_EQ(list.Name(0), nullptr);
-
     // A buffer too small for a single entry holds no symbols.
-    RawImage.assign(sizeof(module_symbol) - 1, 'x');
-    RawCount = 1;
+    SetRaw({}, std::string(sizeof(module_symbol) - 1, 'x'), 1);
     EXPECT_EQ(GetModuleSymbols("raw", &list), 0);
     EXPECT_EQ(list.Buffer, nullptr);
 }
@@ -107,11 +99,9 @@ TEST_F(ModQuery, ModuleInfoIsNeverReadPastTheKernelsRecord) {
     ASSERT_TRUE(GetModuleInfo("velhpdrv", &info));
     EXPECT_FALSE(GetModuleInfo("absent", &info));
     EXPECT_EQ(info, nullptr);  // no record left from the query before
-
     // A kernel whose record is shorter than ours: the flags are read as zero, never past it.
     SysCalls().QueryModule = RawQueryModule;
-    RawImage.assign(sizeof(unsigned long), '\x7f');
-    RawCount = 0;
+    SetRaw({}, std::string(sizeof(unsigned long), '\x7f'), 0);
     ASSERT_TRUE(GetModuleInfo("short", &info));
     EXPECT_EQ(info->flags, 0ul);
     EXPECT_NE(info->addr, 0ul);
