@@ -130,6 +130,8 @@ TEST(FileTable, LinesBecomeDescriptorsUpToTheBufferSize) {
     EXPECT_EQ(small.Count, 2u * 16 + 1);  // no header line
     EXPECT_EQ(small.Range(small.End, 60), Bytes(60 - small.End, 0));
     EXPECT_EQ(small.Range(60, 76), Bytes(16, 0xEE));
+    // Exactly room for two busses and the end marker.
+    EXPECT_EQ(Read("[bus]\n1\n2\n", 16 + 2 * 16 + 1).Count, 2u * 16 + 1);
 
     // No room for even a header and an end marker: nothing is written.
     const Table none = Read("[bus]\n1\n", 16);
