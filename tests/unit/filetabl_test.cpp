@@ -136,6 +136,7 @@ TEST(FileTable, LinesBecomeDescriptorsUpToTheBufferSize) {
     // No room for even a header and an end marker: nothing is written.
     const Table none = Read("[bus]\n1\n", 16);
     EXPECT_EQ(none.Count, 0u);
+    EXPECT_EQ(none.End, 0u);
     EXPECT_EQ(none.Range(4, 16), Bytes(12, 0xEE));
 }
 

@@ -131,8 +131,9 @@ TEST(StrTo32, ClampsAndSetsErangeLikeThe32BitLibrary) {
     for (auto [text, base, u32, value, error, read] :
          {Case("99999999999z", 10, false, INT32_MAX, ERANGE, 11),
           Case("-99999999999", 10, false, INT32_MIN, ERANGE, -1),
-          Case("-5", 10, false, -5, EBADF, -1), Case("0x10", 16, true, 16, EBADF, -1),
-          Case("  +", 10, true, 0, EBADF, 0),
+          Case("-2147483648", 10, false, INT32_MIN, EBADF, -1),
+          Case("2147483647", 10, false, INT32_MAX, EBADF, -1), Case("-5", 10, false, -5, EBADF, -1),
+          Case("0x10", 16, true, 16, EBADF, -1), Case("  +", 10, true, 0, EBADF, 0),
           Case("4294967296", 10, true, 0xFFFFFFFF, ERANGE, -1)}) {
         errno = EBADF;
         char* end = nullptr;
