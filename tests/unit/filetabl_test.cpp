@@ -137,6 +137,7 @@ TEST(FileTable, LinesBecomeDescriptorsUpToTheBufferSize) {
     const Table none = Read("[bus]\n1\n", 16);
     EXPECT_EQ(none.Count, 0u);
     EXPECT_EQ(none.End, 0u);
+    EXPECT_EQ(ReadFileTable(nullptr, nullptr, ASL_PACKET_CAPACITY, nullptr), 0u);
     EXPECT_EQ(none.Range(4, 16), Bytes(12, 0xEE));
 }
 
