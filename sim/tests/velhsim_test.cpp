@@ -95,7 +95,6 @@ TEST(Velhsim, PrintsWhatEachTranscriptSaysAndLeavesTheMachineAsItWas) {
                 actual.replace(at, path.size(), token);
             }
         }
-        WriteWholeFile("/tmp/leansim-" + name + ".out", actual);
         EXPECT_EQ(actual, expected) << name;
         EXPECT_EQ(result.Err, "") << name;
         EXPECT_EQ(Snapshot(machine), before) << name;
