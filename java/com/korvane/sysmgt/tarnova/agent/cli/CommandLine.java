@@ -1,5 +1,7 @@
 package com.korvane.sysmgt.tarnova.agent.cli;
 
+import static com.korvane.sysmgt.tarnova.agent.cli.AgentStatus.*;
+
 import com.korvane.sysmgt.tarnova.agent.TarnovaAgent;
 import java.io.PrintStream;
 import java.util.function.Function;
@@ -7,9 +9,6 @@ import java.util.function.Supplier;
 
 /** The agent's command line: report (default), --json, or --blink SLOT STATE. */
 public final class CommandLine {
-    public static final int EXIT_OK = 0;
-    public static final int EXIT_FAILED = 1;
-    public static final int EXIT_USAGE = 2;
 
     static final String USAGE = String.join("\n",
         "usage: TarnovaAgent [--json | --blink SLOT STATE]",

@@ -75,6 +75,15 @@ public final class InventoryTable {
         return rows[row][field];
     }
 
+    /** The value of the named field for one object. */
+    public long value(int row, String field) {
+        int index = fields.indexOf(field);
+        if (index < 0) {
+            throw new IllegalArgumentException(title + " have no field " + field);
+        }
+        return rows[row][index];
+    }
+
     /** The text of a column for one object; null when the string inventory has no element. */
     public String text(int row, String column) {
         String[] values = texts.get(column);

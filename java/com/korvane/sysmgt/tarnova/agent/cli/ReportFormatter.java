@@ -2,32 +2,19 @@ package com.korvane.sysmgt.tarnova.agent.cli;
 
 import java.util.ArrayList;
 import java.util.List;
-import java.util.Map;
 
 /** The readable report: version, status with its meaning, and one aligned table per kind. */
 public final class ReportFormatter {
     private static final String GAP = "  ";
-    private static final Map<Long, String> STATUS_MEANINGS = Map.of(
-        0L, "all prerequisites met",
-        4L, "no PCI architecture file, and the slot driver is not loaded or not running",
-        6L, "slot driver version below 1.0.0",
-        7L, "the slot driver gave no ASL table",
-        8L, "distribution vendor not supported",
-        9L, "distribution product not supported",
-        10L, "kernel version below 2.4.19");
 
     private ReportFormatter() {
-    }
-
-    public static String describeStatus(long status) {
-        return STATUS_MEANINGS.getOrDefault(status, "unknown status");
     }
 
     public static String format(Inventory inventory) {
         StringBuilder out = new StringBuilder();
         out.append("Agent version: ").append(inventory.version()).append('\n');
         out.append("Status: ").append(inventory.status()).append(" (")
-            .append(describeStatus(inventory.status())).append(")\n");
+            .append(AgentStatus.meaning(inventory.status())).append(")\n");
         for (InventoryTable table : inventory.tables()) {
             out.append('\n');
             appendTable(out, table);
