@@ -6,8 +6,10 @@
 #include <memory>
 #include <new>
 #include <string>
+#include <type_traits>
 
 #include "agent/jnilog.h"
+#include "agent/utf16.h"
 #include "hwobjects.h"
 
 jchar UTF16Buf[UTF16_BUF_UNITS];
@@ -217,13 +219,9 @@ void CountInventories() {
 }
 
 int WcharToUnicode(const wchar_t* text) {
+    static_assert(std::is_same<jchar, uint16_t>::value, "jchar is a 16-bit unit");
     std::fill(std::begin(UTF16Buf), std::end(UTF16Buf), 0);
-    int units = 0;
-    while (units < UTF16_BUF_UNITS && text[units] != L'\0') {
-        UTF16Buf[units] = static_cast<jchar>(static_cast<uint32_t>(text[units]) & 0xFFFFu);
-        ++units;
-    }
-    return units;
+    return TextToUtf16(text, UTF16Buf, UTF16_MAX_CHARS);
 }
 
 void PrintNumInv(const jlong* values, int count) {

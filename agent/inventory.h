@@ -7,8 +7,10 @@
 
 #include <cstdint>
 
-// Capacity of UTF16Buf in UTF-16 units: longer texts reach Java cut to this length.
-constexpr int32_t UTF16_BUF_UNITS = 100;
+// Longer texts reach Java cut to this many characters; a decoded character may take two
+// UTF-16 units, hence the capacity of UTF16Buf.
+constexpr int32_t UTF16_MAX_CHARS = 100;
+constexpr int32_t UTF16_BUF_UNITS = 2 * UTF16_MAX_CHARS;
 extern jchar UTF16Buf[UTF16_BUF_UNITS];
 
 // Element counts of the last acquisition; the inventories size their arrays by them.
@@ -20,8 +22,8 @@ extern int32_t AdapterInvCount;
 // Recounts the four lists into the counts.
 void CountInventories();
 
-// Converts text into UTF16Buf, one unit per character (its low 16 bits), at most
-// UTF16_BUF_UNITS; returns the number of units written.
+// Converts at most UTF16_MAX_CHARS characters of text into UTF16Buf (TextToUtf16: UTF-8 is
+// decoded, other text goes over one unit per character); returns the number of units written.
 int WcharToUnicode(const wchar_t* text);
 // Writes one numeric element to the JNI-side log: "*" and the low 32 bits as a signed decimal
 // per value, then a newline.

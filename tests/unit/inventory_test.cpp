@@ -113,4 +113,28 @@ TEST_F(InventoryTest, StringsAndTheJniLogWithItsOpeningAndOneLinePerElement) {
     EXPECT_FALSE(JniLogOn());
 }
 
+// Bytes that form UTF-8 reach Java decoded, cut after 100 characters without splitting a pair;
+// any other text, Latin-1 or almost UTF-8, goes over byte for byte.
+TEST(WcharToUnicodeTest, DecodesUtf8AndHandsOverOtherTextAsItIs) {
+    const std::wstring a99(99, L'a');
+    const std::wstring smile = L"\xF0\x9F\x98\x80";
+    const struct {
+        std::wstring text;
+        std::u16string java;
+    } cases[] = {
+        {L"f\xC3\xBCr \xE2\x82\xAC", u"f\u00FCr \u20AC"},
+        {L"f\xFCr", u"f\u00FCr"},
+        {L"\xC3\xBC\xE2\x82", u"\u00C3\u00BC\u00E2\u0082"},  // cut short
+        {L"\xC0\xAF", u"\u00C0\u00AF"},                      // overlong
+        {L"\xED\xA0\x80", u"\u00ED\u00A0\u0080"},            // a surrogate
+        {L"\xF4\x90\x80\x80", u"\u00F4\u0090\u0080\u0080"},  // past U+10FFFF
+        {a99 + smile, std::u16string(99, u'a') + u"\U0001F600"},
+        {a99 + L"a" + smile, std::u16string(100, u'a')},
+    };
+    for (const auto& c : cases) {
+        const int units = WcharToUnicode(c.text.c_str());
+        EXPECT_EQ(std::u16string(UTF16Buf, UTF16Buf + units), c.java) << c.java.size();
+    }
+}
+
 }  // namespace

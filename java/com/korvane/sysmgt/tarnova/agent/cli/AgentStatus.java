@@ -23,7 +23,7 @@ public final class AgentStatus {
     private static final Map<Long, String> MEANINGS = Map.of(
         0L, "all prerequisites met",
         4L, "no PCI architecture file, and the slot driver is not loaded or not running",
-        6L, "slot driver version below 1.0.0",
+        6L, "slot driver version below 1.0.0 or unreadable",
         7L, "the slot driver gave no ASL table",
         8L, "distribution vendor not supported",
         9L, "distribution product not supported",

@@ -32,13 +32,14 @@ public final class InventoryTable {
     private final Map<String, String[]> texts = new LinkedHashMap<>();
 
     /**
-     * @param rows a numeric inventory; null (the library could not build it) counts as empty
-     * @throws IllegalArgumentException if an element does not hold one value per field
+     * @param rows a numeric inventory
+     * @throws IllegalArgumentException if the library could not build it (null) or an element
+     *     does not hold one value per field
      */
     public InventoryTable(String title, List<String> fields, long[][] rows) {
         this.title = title;
         this.fields = fields;
-        this.rows = rows == null ? new long[0][] : rows.clone();
+        this.rows = present(rows, title).clone();
         for (int i = 0; i < this.rows.length; i++) {
             if (this.rows[i] == null || this.rows[i].length != fields.size()) {
                 throw new IllegalArgumentException(String.format(
@@ -49,10 +50,21 @@ public final class InventoryTable {
         }
     }
 
-    /** Adds a text column from a string inventory (null counts as empty); returns this table. */
+    /**
+     * Adds a text column from a string inventory; returns this table.
+     *
+     * @throws IllegalArgumentException if the library could not build it (null)
+     */
     public InventoryTable withText(String column, String[] values) {
-        texts.put(column, values == null ? new String[0] : values.clone());
+        texts.put(column, present(values, title + " " + column).clone());
         return this;
+    }
+
+    private static <T> T present(T inventory, String what) {
+        if (inventory == null) {
+            throw new IllegalArgumentException("the library gave no inventory of " + what);
+        }
+        return inventory;
     }
 
     public String title() {

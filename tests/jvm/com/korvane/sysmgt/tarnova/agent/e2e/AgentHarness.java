@@ -66,10 +66,10 @@ final class AgentHarness {
         return run("com.korvane.sysmgt.tarnova.agent.TarnovaAgent", args);
     }
 
-    /** Split at spaces: the agent's arguments if the first begins with "-", else the steps. */
+    /** Split at spaces: the agent's arguments if empty or "-" first, else the steps. */
     Result run(String line) {
-        String[] args = line.split(" ");
-        return line.startsWith("-") ? agent(args) : run(Scenario.class.getName(), args);
+        String[] args = line.isEmpty() ? new String[0] : line.split(" ");
+        return line.matches("-.*|") ? agent(args) : run(Scenario.class.getName(), args);
     }
 
     private Result run(String mainClass, String... args) {

@@ -37,7 +37,8 @@ class AgentTest {
         "relaunch, 0, 1, 2, debug hwinfo hwinfo exit debug hwinfo exit",
         "fork-retried, 1, 1, 1, debug hwinfo hwinfo hwinfo exit",
         "fork-failed, 1000000, 0, 0, debug hwinfo hwinfo hwinfo exit",
-        "command-json, 0, 1, 1, --json", "command-blink, 0, 1, 1, --blink 4294967301 1",
+        "command-json, 0, 1, 1, --json",
+        "version, 0, 0, 0, --version", "help, 0, 0, 0, --help",
         // Finished children do not pile up as zombies.
         "children, 0, 1, 20, hwinfo exit exit exit exit exit exit exit exit exit exit exit exit "
             + "exit exit exit exit exit exit exit exit hwinfo children"})
@@ -45,8 +46,7 @@ class AgentTest {
         String steps) throws Exception {
         AgentHarness.Result result =
             new AgentHarness(temp).withJniLog().forkFailures(forkFailures).run(steps);
-        assertEquals(0, result.exitCode(), result::toString);
-        String stdout = result.stdout();
+        String stdout = result.stdout() + "--- exit " + result.exitCode() + "\n";
         String log = result.jniLog();
         Matcher status = Pattern.compile("status\"?[=:] ?(\\d+)").matcher(stdout);
         if (status.find()) {
@@ -64,19 +64,20 @@ class AgentTest {
 
     @Test
     void theReportAndBadArgumentsWithTheUsageAndExitCode2() throws Exception {
-        AgentHarness.Result report = new AgentHarness(temp).agent();
-        assertEquals(0, report.exitCode(), report::toString);
+        AgentHarness.Result report = new AgentHarness(temp).agent("--tables");
+        assertEquals(3, report.exitCode(), report::toString);
+        assertTrue(report.stderr().startsWith("tarnova-agent: no slot topology found: "));
         assertGolden(data("empty.report"),
             report.stdout().replaceFirst("Status: .*", "Status: STATUS"));
         assertNull(report.jniLog(), "a JNI log is never created");
         // Without touching the library.
-        for (String args : List.of("--blink 1", "--blink x 1", "--blink 1 99999999999",
-                 "--json extra", "--report", "json")) {
+        for (String args : List.of("--blink 1", "--blink x 1", "--blink 1 4294967296",
+                 "--blink 99999999999 1", "--blink 5 -3", "--json extra", "--report", "json")) {
             AgentHarness.Result result =
                 new AgentHarness(temp).withJniLog().agent(args.split(" "));
             assertEquals(2, result.exitCode(), () -> args + ": " + result);
             assertEquals("", result.stdout() + result.jniLog(), args);
-            assertTrue(result.stderr().contains("usage: TarnovaAgent [--json | --blink SLOT STATE]"),
+            assertTrue(result.stderr().contains("usage: tarnova-agent [--tables | --json |"),
                 () -> args + ": " + result.stderr());
             assertNull(result.hwLog(), args);
         }
@@ -112,6 +113,8 @@ class AgentTest {
         // The name's lone surrogate has no UTF-8 form; its length still sets the column's width.
         assertGolden(data("formatting.report"),
             ReportFormatter.format(sample()).replace(AWKWARD_NAME, "Drawer (awkward)"));
+        assertGolden(data("formatting.slots"),
+            SlotReport.format(Machine.of(sample())).replace(AWKWARD_NAME, "Drawer (awkward)"));
     }
 
     @Test
@@ -120,6 +123,7 @@ class AgentTest {
             InventoryTable.BUS_FIELDS, new long[][] {new long[11]}));
         assertThrows(IllegalArgumentException.class, () -> new InventoryTable("busses",
             InventoryTable.BUS_FIELDS, new long[][] {null}));
-        assertEquals(0, new InventoryTable("busses", InventoryTable.BUS_FIELDS, null).size());
+        assertThrows(IllegalArgumentException.class,
+            () -> new InventoryTable("busses", InventoryTable.BUS_FIELDS, null));
     }
 }

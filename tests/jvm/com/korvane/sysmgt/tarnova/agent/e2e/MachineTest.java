@@ -27,8 +27,20 @@ class MachineTest {
         {"chassis-drawer", "chassis-drawer", "", "--json"},
         {"chassis-drawer", "chassis-drawer", "", "--json"},
         {"no-card-file", "chassis-drawer", "rm install/velhadp.crd", "--json"},
-        // The driver gets the low 32 bits of the slot.
-        {"blink", "chassis-drawer", "", "--blink 4294967301 -1"},
+        // The readable report of each sample; no topology without a driver and a file.
+        {"report-chassis-drawer", "chassis-drawer", "", ""},
+        {"report-file-table", "file-table", "", ""},
+        {"report-current-kernel", "current-kernel", "", ""},
+        {"report-cardfile-mistakes", "cardfile-mistakes", "", ""},
+        {"no-topology", "chassis-drawer", "rm -r driver modules/velhpdrv", "--tables"},
+        // A vendor name in UTF-8 reaches Java decoded: "f\u00fcr", not "f\u00c3\u00bcr".
+        {"utf8-name", "chassis-drawer",
+            "sed -i 's/^10df  Emulex Corporation/10df  Emulex f\\xc3\\xbcr Fasern/' usr/share/pci.ids",
+            "--json"},
+        // A blink the driver takes, refuses, and one of a slot ID that no slot has.
+        {"blink", "chassis-drawer", "", "--blink 4 4294967295"},
+        {"blink-refused", "chassis-drawer", "echo blink >driver/fail", "--blink 3 1"},
+        {"blink-no-slot", "chassis-drawer", "", "--blink 14 1"},
         // A PCI architecture file named after the firmware's machine type (K320) and model (F1T)
         // stands in for the slot driver.
         {"file-table", "file-table", "", "--json"},
@@ -52,14 +64,48 @@ class MachineTest {
         AgentHarness harness =
             new AgentHarness(temp).onMachine(AgentHarness.sample(test[1])).edit(test[2]);
         AgentHarness.Result result = harness.run(test[3]);
-        assertEquals(0, result.exitCode(), result::toString);
         // Each JVM is process 2 of its namespace: its perf data file goes to the run's own /tmp.
         String perfData = "tmp/hsperfdata_" + System.getProperty("user.name");
         assertTrue(Files.isDirectory(result.runDir().resolve(perfData)), result::toString);
-        return result.stdout() + "--- driver requests\n"
+        return result.stdout() + "--- exit " + result.exitCode() + "\n"
+            + result.stderr().replace(result.runDir().toString(), "RUN")
+            + "--- driver requests\n"
             + Objects.toString(result.file("driver/requests.log"), "") + "--- driver blink\n"
             + Objects.toString(result.file("driver/blink.log"), "") + "--- hardware log\n"
             + result.hwLog();
+    }
+
+    /**
+     * Each adapter of the inventory table in the sample's EXPECTED.md has a line in the report
+     * with its address, driver file and boot flag, under its card's name (or with its own) and
+     * in the section of its slot: its label and ID, on-board, or no slot the table lists.
+     */
+    static void assertReportAgrees(String sample, List<String> report) throws Exception {
+        String expected = Files.readString(AgentHarness.sample(sample).resolve("EXPECTED.md"));
+        String table = expected.substring(expected.indexOf("## Inventory"));
+        for (String row : table.substring(0, table.indexOf("\n## ")).split("\n")) {
+            String[] cell = row.split(" \\| ");
+            if (!row.matches("\\| \\d+ \\|.*")) {
+                continue;
+            }
+            String line = cell[2].replace("-1", "-") + "  driver "
+                + cell[15].replace("(empty)", "-") + (cell[11].equals("yes") ? "  boot device" : "");
+            int at = report.indexOf(report.stream().filter(l -> (l.trim() + "  ").startsWith(
+                line + "  ")).findFirst().orElseThrow(() -> new AssertionError(sample + row)));
+            String card = "";
+            String section = "";
+            for (int i = at; i >= 0 && section.isEmpty(); i--) {
+                String above = report.get(i);
+                card = card.isEmpty() && above.matches(".*  \\[[-0-9a-f:]+\\]") ? above : card;
+                section = above.matches("(  Slot \\d|  Unnumbered|On-board|Cards in).*") ? above : "";
+            }
+            assertTrue(card.trim().startsWith(cell[14] + "  [")
+                || report.get(at).endsWith("  " + cell[14]), sample + row);
+            assertTrue(section.startsWith(cell[12].equals("yes") ? "On-board devices"
+                : cell[4].equals("-1") ? "Cards in slots"
+                : (cell[4].equals("255") ? "  Unnumbered slot" : "  Slot " + cell[4])
+                    + " (ID " + cell[3] + ")"), sample + row + section);
+        }
     }
 
     @Test
@@ -68,8 +114,13 @@ class MachineTest {
         List<Executable> checks = new ArrayList<>();
         for (String[] test : CASES) {
             Future<String> outcome = pool.submit(() -> outcome(test));
-            checks.add(() -> AgentHarness.assertGolden(
-                AgentHarness.data("machine/" + test[0] + ".txt"), outcome.get()));
+            checks.add(() -> {
+                AgentHarness.assertGolden(
+                    AgentHarness.data("machine/" + test[0] + ".txt"), outcome.get());
+                if (test[0].startsWith("report-")) {
+                    assertReportAgrees(test[1], outcome.get().lines().toList());
+                }
+            });
         }
         pool.shutdown();
         assertAll(checks);
