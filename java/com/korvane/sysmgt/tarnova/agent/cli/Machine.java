@@ -67,6 +67,16 @@ public final class Machine {
         topology = systemTable.size() + busTable.size() + slotTable.size() > 0;
     }
 
+    /** Whether a text of the library says something: it is not absent, empty or unavailable. */
+    public static boolean known(String text) {
+        return text != null && !text.isEmpty() && !text.equals("<Unavailable>");
+    }
+
+    /** A bus or device number as lspci prints it; none for the agent's none value. */
+    public static String hex(long value, String none) {
+        return value == NONE ? none : String.format("%02x", value);
+    }
+
     /** Joins the inventories of one run. */
     public static Machine of(Inventory inventory) {
         return new Machine(inventory);

@@ -128,14 +128,13 @@ public final class PrometheusWriter {
         return value == Machine.NO_NUMBER || value == Machine.NONE ? "" : Long.toString(value);
     }
 
-    /** A bus or device number as lspci prints it. */
     private static String hex(long value) {
-        return value == Machine.NONE ? "" : String.format("%02x", value);
+        return Machine.hex(value, "");
     }
 
     /** A text of the library; empty for none, as Prometheus reads an empty label. */
     private static String text(String value) {
-        return value == null || value.equals("<Unavailable>") ? "" : value;
+        return Machine.known(value) ? value : "";
     }
 
     /** One metric family: help, type and samples, all with the same label names. */

@@ -116,7 +116,7 @@ public final class SlotReport {
     }
 
     private static String hex(long value) {
-        return value == Machine.NONE ? NONE : String.format("%02x", value);
+        return Machine.hex(value, NONE);
     }
 
     private static String number(long value) {
@@ -129,6 +129,6 @@ public final class SlotReport {
 
     /** A text, "-" for none: absent, empty or unavailable. */
     private static String text(String value) {
-        return value == null || value.isEmpty() || value.equals("<Unavailable>") ? NONE : value;
+        return Machine.known(value) ? value : NONE;
     }
 }

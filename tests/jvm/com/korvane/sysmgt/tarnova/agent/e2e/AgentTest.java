@@ -72,7 +72,8 @@ class AgentTest {
         assertNull(report.jniLog(), "a JNI log is never created");
         // Without touching the library.
         for (String args : List.of("--blink 1", "--blink x 1", "--blink 1 4294967296",
-                 "--blink 99999999999 1", "--blink 5 -3", "--json extra", "--report", "json")) {
+                 "--blink 99999999999 1", "--blink 5 -3", "--json extra", "--report", "json",
+                 "--prometheus --output", "--prometheus --json x", "--prometheus x")) {
             AgentHarness.Result result =
                 new AgentHarness(temp).withJniLog().agent(args.split(" "));
             assertEquals(2, result.exitCode(), () -> args + ": " + result);
