@@ -16,7 +16,8 @@ import java.util.function.Supplier;
 
 /**
  * The agent's command line: the slot report (default), --tables, --json, --prometheus,
- * --blink SLOT STATE, --version and --help. Results go to standard output, warnings and errors to standard error.
+ * --blink SLOT STATE, --version and --help. Results go to standard output, warnings and errors
+ * to standard error.
  */
 public final class CommandLine {
     /** The version of this agent class and its command line. */
@@ -33,8 +34,9 @@ public final class CommandLine {
         "  --tables            the four inventories as raw tables",
         "  --json              the four inventories as one JSON document",
         "  --prometheus        the slots, busses and status as Prometheus metrics",
-        "    --output FILE     replace FILE with them in one step (for the node exporter's",
-        "                      text-file collector, which must never read half a file)",
+        "    --output FILE     replace FILE (an absolute path) with them in one step, for the",
+        "                      node exporter's text-file collector, which must never read half",
+        "                      a file",
         "  --blink SLOT STATE  set the blink state of a slot's attention LED through the slot",
         "                      driver; SLOT is a slot ID as the report shows it, STATE the",
         "                      driver's value (0 to 4294967295)",
@@ -76,6 +78,11 @@ public final class CommandLine {
                 }
                 CommandLine metrics = new CommandLine(Mode.PROMETHEUS, 0, 0);
                 metrics.output = args.length == 3 ? Path.of(args[2]) : null;
+                // The launcher runs the agent in its install folder, not where it was started.
+                if (metrics.output != null && !metrics.output.isAbsolute()) {
+                    throw new IllegalArgumentException(
+                        "--output takes an absolute path: " + args[2]);
+                }
                 return metrics;
             case "--blink":
                 expectCount(args, 3);

@@ -73,7 +73,7 @@ class AgentTest {
         // Without touching the library.
         for (String args : List.of("--blink 1", "--blink x 1", "--blink 1 4294967296",
                  "--blink 99999999999 1", "--blink 5 -3", "--json extra", "--report", "json",
-                 "--prometheus --output", "--prometheus --json x", "--prometheus x")) {
+                 "--prometheus --output", "--prometheus --json x", "--prometheus --output x")) {
             AgentHarness.Result result =
                 new AgentHarness(temp).withJniLog().agent(args.split(" "));
             assertEquals(2, result.exitCode(), () -> args + ": " + result);
