@@ -1,6 +1,7 @@
 // velhsim: runs a command against a described machine.
 //
 //   velhsim [--i386] --machine DIR [--run-dir RUN] -- COMMAND [ARG...]
+//   velhsim --clean | --help
 //
 // The machine folder is copied into the run folder, and the command runs there, in RUN/install,
 // in private namespaces in which the run folder's machine replaces the real one. Its status is
@@ -40,14 +41,18 @@ constexpr const char* I386_EMULATOR = "qemu-i386";
 
 const char* const USAGE =
     "usage: velhsim [--i386] --machine DIR [--run-dir RUN] -- COMMAND [ARG...]\n"
+    "       velhsim --clean | --help\n"
     "Copies the machine folder DIR into the run folder RUN (a new temporary folder when not\n"
     "given) and runs COMMAND in RUN/install against that machine; with --i386, a 32-bit\n"
-    "COMMAND under qemu-i386.\n";
+    "COMMAND under qemu-i386. --clean removes the temporary run folders (velhsim.*) that\n"
+    "earlier runs left in $TMPDIR or /tmp.\n";
 
 struct Options {
     std::string Machine;
     std::string RunDir;
     bool I386 = false;
+    bool Help = false;
+    bool Clean = false;
     std::vector<std::string> Command;
 };
 
@@ -72,6 +77,13 @@ bool TakeValue(const std::string& name, int argc, char** argv, int* i, std::stri
 
 std::optional<Options> ParseOptions(int argc, char** argv, std::string* error) {
     Options options;
+    if (argc == 2) {
+        options.Help = std::strcmp(argv[1], "--help") == 0 || std::strcmp(argv[1], "-h") == 0;
+        options.Clean = std::strcmp(argv[1], "--clean") == 0;
+        if (options.Help || options.Clean) {
+            return options;
+        }
+    }
     int i = 1;
     for (; i < argc && std::strcmp(argv[i], "--") != 0; ++i) {
         if (std::strcmp(argv[i], "--i386") == 0) {
@@ -236,6 +248,16 @@ int main(int argc, char** argv) {
     if (!options) {
         std::fprintf(stderr, "velhsim: %s\n%s", error.c_str(), USAGE);
         return LAUNCHER_FAILED;
+    }
+    if (options->Help) {
+        std::fputs(USAGE, stdout);
+        return 0;
+    }
+    if (options->Clean) {
+        for (const std::string& folder : RemoveRunFolders(&error)) {
+            std::printf("velhsim: removed %s\n", folder.c_str());
+        }
+        return error.empty() ? 0 : Fail(error);
     }
     return Run(*options);
 }

@@ -44,6 +44,43 @@ bool MakeFolder(const std::string& path, std::string* error) {
     return true;
 }
 
+// Copies the tree entry by entry, so that a failure names the entry: an unreadable file, a
+// special file (a pipe, a device), a full disk.
+bool CopyTree(const fs::path& from, const fs::path& to, std::string* error) {
+    std::error_code code;
+    fs::recursive_directory_iterator entries(from, code);
+    for (const fs::recursive_directory_iterator end; !code && entries != end;
+         entries.increment(code)) {
+        const fs::path& source = entries->path();
+        const fs::path target = to / source.lexically_relative(from);
+        const fs::file_status status = entries->symlink_status(code);
+        if (code) {
+            break;
+        }
+        if (fs::is_symlink(status)) {
+            fs::copy_symlink(source, target, code);
+        } else if (fs::is_directory(status)) {
+            fs::create_directory(target, source, code);
+        } else if (fs::is_regular_file(status)) {
+            fs::copy_file(source, target, code);
+        } else {
+            code = std::make_error_code(std::errc::not_supported);
+        }
+        if (code) {
+            *error = "cannot copy " + source.string() + " to " + target.string() + ": " +
+                     (code == std::errc::not_supported
+                          ? std::string("not a file, folder or symbolic link")
+                          : code.message());
+            return false;
+        }
+    }
+    if (code) {
+        *error = "cannot copy " + from.string() + " to " + to.string() + ": " + code.message();
+        return false;
+    }
+    return true;
+}
+
 // The table from its text form, through the library's own reader in the pci2asl tool.
 bool CompileTable(const std::string& run, const std::string& toolDir, std::string* error) {
     const std::string source = JoinPath(run, "driver/asl.pci");
@@ -82,10 +119,17 @@ bool CheckRunFolder(const std::string& machine, const std::string& run, std::str
     return true;
 }
 
-std::string MakeTemporaryRunFolder(std::string* error) {
+namespace {
+
+std::string TemporaryFolder() {
     const char* base = std::getenv("TMPDIR");
-    std::string pattern =
-        JoinPath(base != nullptr && *base == '/' ? base : "/tmp", "velhsim.XXXXXX");
+    return base != nullptr && *base == '/' ? base : "/tmp";
+}
+
+}  // namespace
+
+std::string MakeTemporaryRunFolder(std::string* error) {
+    std::string pattern = JoinPath(TemporaryFolder(), RUN_FOLDER_PREFIX + std::string("XXXXXX"));
     if (mkdtemp(pattern.data()) == nullptr) {
         *error = pattern + ": " + std::strerror(errno);
         return {};
@@ -98,10 +142,7 @@ bool PrepareRunFolder(const std::string& machine, const std::string& run,
     if (!MakeFolder(run, error)) {
         return false;
     }
-    std::error_code code;
-    fs::copy(machine, run, fs::copy_options::recursive | fs::copy_options::copy_symlinks, code);
-    if (code) {
-        *error = "cannot copy " + machine + " to " + run + ": " + code.message();
+    if (!CopyTree(machine, run, error)) {
         return false;
     }
     if (Exists(JoinPath(run, "firmware")) && !Exists(JoinPath(run, "dev/mem")) &&
@@ -118,6 +159,42 @@ bool PrepareRunFolder(const std::string& machine, const std::string& run,
         return false;
     }
     return MakeFolder(JoinPath(run, "install"), error) && MakeFolder(JoinPath(run, "log"), error);
+}
+
+std::vector<std::string> RemoveRunFolders(std::string* error) {
+    std::vector<std::string> removed;
+    std::error_code code;
+    const std::string base = TemporaryFolder();
+    for (fs::directory_iterator entries(base, code), end; !code && entries != end;
+         entries.increment(code)) {
+        const fs::path& path = entries->path();
+        struct stat info {};
+        // Only the folders of this user that velhsim made: its name pattern, no symbolic link.
+        if (path.filename().string().rfind(RUN_FOLDER_PREFIX, 0) != 0 ||
+            lstat(path.c_str(), &info) != 0 || !S_ISDIR(info.st_mode) || info.st_uid != getuid()) {
+            continue;
+        }
+        // A run may leave folders without write permission, which would keep their files.
+        std::error_code ignored;
+        for (fs::recursive_directory_iterator inner(path, ignored), last; !ignored && inner != last;
+             inner.increment(ignored)) {
+            if (inner->is_directory(ignored) && !inner->is_symlink(ignored)) {
+                fs::permissions(inner->path(), fs::perms::owner_all, fs::perm_options::add,
+                                ignored);
+            }
+        }
+        std::error_code failed;
+        fs::remove_all(path, failed);
+        if (failed) {
+            *error = "cannot remove " + path.string() + ": " + failed.message();
+            return removed;
+        }
+        removed.push_back(path.string());
+    }
+    if (code) {
+        *error = base + ": " + code.message();
+    }
+    return removed;
 }
 
 }  // namespace velhsim

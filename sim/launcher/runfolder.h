@@ -3,6 +3,7 @@
 #pragma once
 
 #include <string>
+#include <vector>
 
 namespace velhsim {
 
@@ -10,8 +11,15 @@ namespace velhsim {
 // that the overlay mounts can take. False with the reason otherwise.
 bool CheckRunFolder(const std::string& machine, const std::string& run, std::string* error);
 
+// The name of every run folder that velhsim makes itself, followed by six random characters.
+constexpr const char* RUN_FOLDER_PREFIX = "velhsim.";
+
 // A fresh folder under $TMPDIR (or /tmp); empty on failure with the reason.
 std::string MakeTemporaryRunFolder(std::string* error);
+
+// Removes the run folders that velhsim made under $TMPDIR (or /tmp) and this user owns; returns
+// their paths. On a failure the reason is in `error` and the folders removed so far are returned.
+std::vector<std::string> RemoveRunFolders(std::string* error);
 
 // Copies the machine into `run` and builds there what the machine gives in readable form:
 // dev/mem from "firmware", proc/bus/pci from "lspci.txt", driver/asl.bin from driver/asl.pci

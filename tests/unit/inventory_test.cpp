@@ -125,6 +125,8 @@ TEST(WcharToUnicodeTest, DecodesUtf8AndHandsOverOtherTextAsItIs) {
         {L"f\xC3\xBCr \xE2\x82\xAC", u"f\u00FCr \u20AC"},
         {L"f\xFCr", u"f\u00FCr"},
         {L"\xC3\xBC\xE2\x82", u"\u00C3\u00BC\u00E2\u0082"},  // cut short
+        {L"\xC3\xBC\x80", u"\u00C3\u00BC\u0080"},            // a stray continuation
+        {L"\xC3\u0180", u"\u00C3\u0180"},                    // a character, not a byte
         {L"\xC0\xAF", u"\u00C0\u00AF"},                      // overlong
         {L"\xED\xA0\x80", u"\u00ED\u00A0\u0080"},            // a surrogate
         {L"\xF4\x90\x80\x80", u"\u00F4\u0090\u0080\u0080"},  // past U+10FFFF
