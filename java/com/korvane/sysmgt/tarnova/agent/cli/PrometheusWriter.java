@@ -33,20 +33,36 @@ public final class PrometheusWriter {
      * @param warnings where a sample that repeats another one's labels is reported
      */
     public static String write(Machine machine, long acquiredMillis, PrintStream warnings) {
+        List<Family> families = agentFamilies(machine, acquiredMillis);
+        families.addAll(slotFamilies(machine));
+        families.add(adapterFamily(machine));
+        StringBuilder out = new StringBuilder();
+        for (Family family : families) {
+            family.appendTo(out, warnings);
+        }
+        return out.toString();
+    }
+
+    private static List<Family> agentFamilies(Machine machine, long acquiredMillis) {
         StringBuilder statusHelp = new StringBuilder("Prerequisite status of the agent:");
         for (long code : STATUS_CODES) {
             statusHelp.append(code == 0 ? " " : "; ").append(code).append(' ')
                 .append(AgentStatus.meaning(code));
         }
-        List<Family> families = new ArrayList<>();
-        families.add(new Family("tarnova_agent_info", "The agent's version.", "version")
-            .add("1", machine.version()));
-        families.add(new Family("tarnova_agent_status", statusHelp + ".")
-            .add(Long.toString(machine.status())));
-        families.add(new Family("tarnova_acquisition_timestamp_seconds",
-            "When the agent began to read the slot hardware, in seconds since the epoch.")
-            .add(String.format("%d.%03d", acquiredMillis / 1000, acquiredMillis % 1000)));
+        String seconds = String.format("%d.%03d", Math.floorDiv(acquiredMillis, 1000),
+            Math.floorMod(acquiredMillis, 1000));
+        return new ArrayList<>(List.of(
+            new Family("tarnova_agent_info", "The agent's version.", "version")
+                .add("1", machine.version()),
+            new Family("tarnova_agent_status", statusHelp + ".")
+                .add(Long.toString(machine.status())),
+            new Family("tarnova_acquisition_timestamp_seconds",
+                "When the agent began to read the slot hardware, in seconds since the epoch.")
+                .add(seconds)));
+    }
 
+    /** Per slot its info and gauges; per bus with slots, once, its speed and mode. */
+    private static List<Family> slotFamilies(Machine machine) {
         Family slotInfo = new Family("tarnova_slot_info",
             "A PCI slot: where it is, its bus and device, and the card in it, named by its "
                 + "first function (adapter labels empty when the slot is empty).",
@@ -84,6 +100,11 @@ public final class PrometheusWriter {
                 }
             }
         }
+        return List.of(slotInfo, power, blinking, attention, speed, pciX);
+    }
+
+    /** The on-board devices, and the cards whose slot the slot inventory does not list. */
+    private static Family adapterFamily(Machine machine) {
         Family adapters = new Family("tarnova_adapter_info",
             "A PCI device outside the listed slots: on the system board (onboard 1), or a card "
                 + "that the card file places in a slot the slot table does not list.",
@@ -98,13 +119,7 @@ public final class PrometheusWriter {
                 adapters.add("1", info.toArray(new String[0]));
             }
         }
-        families.addAll(List.of(slotInfo, power, blinking, attention, speed, pciX, adapters));
-
-        StringBuilder out = new StringBuilder();
-        for (Family family : families) {
-            family.appendTo(out, warnings);
-        }
-        return out.toString();
+        return adapters;
     }
 
     /** The card's labels: name, vendor:device and driver of its first function. */
