@@ -6,7 +6,7 @@ namespace {
 // that starts no valid sequence (a stray continuation, an overlong form, a surrogate, a code
 // past U+10FFFF, a character above 0xFF, or a sequence cut short).
 int32_t DecodeOne(const wchar_t* text, int32_t* length) {
-    const auto lead = static_cast<uint32_t>(text[0]);
+    const auto lead = static_cast<uint32_t>(static_cast<int32_t>(text[0]));
     int32_t count = 0;
     uint32_t code = 0;
     uint32_t least = 0;
@@ -30,7 +30,7 @@ int32_t DecodeOne(const wchar_t* text, int32_t* length) {
         return -1;
     }
     for (int32_t i = 1; i < count; ++i) {
-        const auto next = static_cast<uint32_t>(text[i]);
+        const auto next = static_cast<uint32_t>(static_cast<int32_t>(text[i]));
         if ((next & 0xC0u) != 0x80u || next > 0xFFu) {  // The terminator ends here too.
             return -1;
         }
