@@ -4,7 +4,7 @@
 
 #include <cstdint>
 
-#include "hwobjects.h"
+#include "model/hwobjects.h"
 #include "pciconfig.h"
 
 // Four-byte items between 0x40 and 0xFF: a list that goes on longer runs in a loop.

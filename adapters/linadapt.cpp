@@ -8,7 +8,7 @@
 #include "adapters/moddriver.h"
 #include "adapters/pciname.h"
 #include "diag/hwdebug.h"
-#include "hwobjects.h"
+#include "model/hwobjects.h"
 #include "util/parstool.h"
 #include "util/sysaccess.h"
 

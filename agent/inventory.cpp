@@ -8,7 +8,7 @@
 #include <string>
 
 #include "agent/jnilog.h"
-#include "hwobjects.h"
+#include "model/hwobjects.h"
 
 jchar UTF16Buf[UTF16_BUF_UNITS];
 

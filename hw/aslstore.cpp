@@ -5,7 +5,7 @@
 
 #include "diag/hwdebug.h"
 #include "diag/progname.h"
-#include "hwobjects.h"
+#include "model/hwobjects.h"
 #include "sources/aslpacket.h"
 
 namespace {

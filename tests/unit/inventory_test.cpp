@@ -10,7 +10,7 @@
 
 #include "agent/jnilog.h"
 #include "fake_jni.h"
-#include "hwobjects.h"
+#include "model/hwobjects.h"
 #include "scratchdir.h"
 
 namespace {
