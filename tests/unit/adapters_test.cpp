@@ -87,8 +87,10 @@ TEST(CapabilityWalk, ReadsKnownItemsWithinTheImageAndDerivesPciX) {
 TEST(ProcBusPci, BusFoldersAndFunctionFiles) {
     _FILE_ATTRIBS entry{};
     uint32_t device = 0, function = 0;
-    for (auto [name, bus] :
-         {std::pair{"1f", 0x1f}, {"0000:00", 0}, {"0000:0a", 10}, {"0000:zz", -1}, {"x1", -1}}) {
+    const std::pair<const char*, int> busses[] = {
+        {"1f", 0x1f},    {"0000:00", 0},  {"0000:0a", 10},  {"0000:zz", 0},
+        {"0e:03", 0x0e}, {"1f:zz", 0x1f}, {"0001:1f.x", 1}, {"x1", -1}};
+    for (auto [name, bus] : busses) {
         std::strcpy(entry.EntryName, name);
         EXPECT_EQ(isBus(&entry, &device) ? static_cast<int>(device) : -1, bus) << name;
     }
