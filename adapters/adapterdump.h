@@ -1,7 +1,7 @@
 // Dumps of adapters and of PCI configuration images with their capability lists.
 #pragma once
 
-#include "hwobjects.h"
+#include "model/hwobjects.h"
 #include "pciconfig.h"
 
 // The installed and the card file's adapters, on-board ones and the others as the level asks.

@@ -16,6 +16,8 @@ namespace {
 
 constexpr uint8_t CAP_HEADER_BYTES = sizeof(CAP_ITEM_HEADER);
 constexpr uint8_t MSI_64BIT_ADDRESS = 0x80;
+// The longest item the library reads: MSI with a 64-bit address.
+constexpr int CAP_ITEM_MAX_BYTES = 14;
 constexpr uint32_t PCIX_STATUS_64BIT = 0x10000;
 constexpr uint32_t PCIX_STATUS_133MHZ = 0x20000;
 constexpr uint8_t HEADER_TYPE_BRIDGE = 1;
@@ -44,7 +46,7 @@ int CapabilityLen(const CAP_ITEM_HEADER* item) {
         case CAP_SLOT_ID:
             return 4;
         case CAP_MSI:
-            return (item->Data[0] & MSI_64BIT_ADDRESS) != 0 ? 14 : 10;
+            return (item->Data[0] & MSI_64BIT_ADDRESS) != 0 ? CAP_ITEM_MAX_BYTES : 10;
         case CAP_HOTSWAP:
             return 2;
         case CAP_PCIX:
@@ -72,21 +74,27 @@ uint8_t ReadCapabilityItem(int file, uint8_t offset, uint8_t* item, int* length)
     if (itemLength == 0) {
         return 0;
     }
-    if (offset + itemLength > static_cast<int>(PCI_CONFIG_SIZE)) {
-        ErrMsg("ReadCapabilityItem()", "item at 0x%02x reaches past the configuration image",
-               offset);
-        return 0;
-    }
     if (!SeekTo(file, offset)) {
         LastErr(nullptr, "ReadCapabilityItem()", "item lseek() failed");
         return 0;
     }
-    got = ReadFully(file, item, static_cast<uint32_t>(itemLength));
+    // Read whole first: an item cut short by the end of a 256-byte file is a short read that
+    // keeps what it got; only a longer file can hold an item that the image cannot.
+    uint8_t whole[CAP_ITEM_MAX_BYTES] = {};
+    got = ReadFully(file, whole, static_cast<uint32_t>(itemLength));
+    const int room = static_cast<int>(PCI_CONFIG_SIZE) - offset;
     if (got != itemLength) {
+        std::memcpy(item, whole, static_cast<size_t>(std::clamp(got, 0, room)));
         int32_t error = ReadError(got);
         LastErr(&error, "ReadCapabilityItem()", "item read() failed");
         return 0;
     }
+    if (itemLength > room) {
+        ErrMsg("ReadCapabilityItem()", "item at 0x%02x reaches past the configuration image",
+               offset);
+        return 0;
+    }
+    std::memcpy(item, whole, static_cast<size_t>(itemLength));
     *length = itemLength;
     return item[1] & PCI_CAP_POINTER_MASK;
 }

@@ -4,7 +4,7 @@
 
 #include <cstdint>
 
-#include "hwobjects.h"
+#include "model/hwobjects.h"
 #include "pciconfig.h"
 
 // Four-byte items between 0x40 and 0xFF: a list that goes on longer runs in a loop.
@@ -14,9 +14,10 @@ constexpr unsigned CAP_WALK_LIMIT = 48;
 // the count copied, 0 on failure.
 int GetPciConfig(const char* path, int offset, int size, char* out);
 // Reads the item at `offset` of the open configuration file into `item`, which is that offset of
-// a 256-byte image: an item that would reach past the image is not read. Sets `*length` to the
-// bytes read (0 on failure or for an unknown ID) and returns the next pointer masked with 0xFC,
-// 0 when the walk ends here.
+// a 256-byte image: an item cut short by the file's end keeps the bytes read, one that a longer
+// file holds past the image's last byte is left out. Sets `*length` to the bytes read (0 on
+// failure or for an unknown ID) and returns the next pointer masked with 0xFC, 0 when the walk
+// ends here.
 uint8_t ReadCapabilityItem(int file, uint8_t offset, uint8_t* item, int* length);
 // The bytes read for an item of this ID: 0 for an ID the library does not know.
 int CapabilityLen(const CAP_ITEM_HEADER* item);

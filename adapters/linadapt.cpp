@@ -8,7 +8,7 @@
 #include "adapters/moddriver.h"
 #include "adapters/pciname.h"
 #include "diag/hwdebug.h"
-#include "hwobjects.h"
+#include "model/hwobjects.h"
 #include "util/parstool.h"
 #include "util/sysaccess.h"
 
@@ -30,6 +30,17 @@ void TraceEntry(const char* kind, const char* path) {
 
 bool IsHexDigit(char c) {
     return std::isxdigit(static_cast<unsigned char>(c)) != 0;
+}
+
+// Current kernels name a bus of a PCI domain "0000:01": four hex digits, a colon, two more.
+constexpr size_t DOMAIN_DIGITS = 4;
+constexpr size_t BUS_DIGITS = 2;
+
+bool IsDomainBus(const char* name) {
+    const char* hex = "0123456789abcdefABCDEF";
+    return std::strlen(name) == DOMAIN_DIGITS + 1 + BUS_DIGITS && name[DOMAIN_DIGITS] == ':' &&
+           std::strspn(name, hex) == DOMAIN_DIGITS &&
+           std::strspn(name + DOMAIN_DIGITS + 1, hex) == BUS_DIGITS;
 }
 
 // The BusID of the first bus object with this number, or none.
@@ -96,14 +107,9 @@ bool isBus(const _FILE_ATTRIBS* attribs, uint32_t* bus) {
     if (!IsHexDigit(name[0])) {
         return false;
     }
-    // "0000:01" is bus 1 of domain 0, not bus 0.
-    const char* colon = std::strchr(name, ':');
-    if (colon != nullptr &&
-        std::strspn(name, "0123456789abcdefABCDEF") == static_cast<size_t>(colon - name)) {
-        if (!IsHexDigit(colon[1])) {
-            return false;
-        }
-        name = colon + 1;
+    // Any other name is read from its start, the text after its number ignored.
+    if (IsDomainBus(name)) {
+        name += DOMAIN_DIGITS + 1;
     }
     return ustrl(name, bus, 16);
 }

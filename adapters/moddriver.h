@@ -1,7 +1,7 @@
 // Each adapter's kernel module, driver object file and boot-device flag.
 #pragma once
 
-#include "hwobjects.h"
+#include "model/hwobjects.h"
 
 // Sets ModuleName from the PCI device list in procRoot.
 void GetModuleName(AdapterDescriptor* adapter, const char* procRoot);

@@ -1,7 +1,7 @@
 // Adapter names from the PCI ID database.
 #pragma once
 
-#include "hwobjects.h"
+#include "model/hwobjects.h"
 #include "pciconfig.h"
 
 // Sets the adapter's Name; false only when the database cannot be opened.

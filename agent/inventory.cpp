@@ -10,7 +10,7 @@
 
 #include "agent/jnilog.h"
 #include "agent/utf16.h"
-#include "hwobjects.h"
+#include "model/hwobjects.h"
 
 jchar UTF16Buf[UTF16_BUF_UNITS];
 
@@ -125,14 +125,15 @@ jobjectArray BuildNumeric(JNIEnv* env, const NumericKind<T>& kind) {
         return nullptr;
     }
     jobjectArray result = env->NewObjectArray(kind.Count, elementClass, nullptr);
+    env->DeleteLocalRef(elementClass);
     if (result == nullptr) {
         LogLine(kind.ResultFailed);
         return nullptr;
     }
-    env->DeleteLocalRef(elementClass);
     std::unique_ptr<jlong[]> values(new (std::nothrow) jlong[kind.Length]);
     if (!values) {
         LogLine(kind.BufferFailed);
+        env->DeleteLocalRef(result);
         return nullptr;
     }
 
@@ -146,6 +147,7 @@ jobjectArray BuildNumeric(JNIEnv* env, const NumericKind<T>& kind) {
         jlongArray element = env->NewLongArray(kind.Length);
         if (element == nullptr) {
             LogLine(kind.ElementFailed);
+            env->DeleteLocalRef(result);
             return nullptr;
         }
         std::fill_n(values.get(), kind.Length, 0);
@@ -173,21 +175,22 @@ struct StringKind {
 template <typename T>
 jobjectArray BuildStrings(JNIEnv* env, const StringKind<T>& kind) {
     LogLine(kind.Opening);
-    // After a failed call its exception is pending: no further JNI call is made.
+    // After a failed call its exception is pending: no further JNI call is made but the
+    // release of local references, which the JNI allows then.
     jclass stringClass = env->FindClass("java/lang/String");
     if (stringClass == nullptr) {
         return nullptr;
     }
     jstring empty = env->NewStringUTF("");
-    if (empty == nullptr) {
-        return nullptr;
+    jobjectArray result = nullptr;
+    if (empty != nullptr) {
+        result = env->NewObjectArray(kind.Count, stringClass, empty);
+        env->DeleteLocalRef(empty);
     }
-    jobjectArray result = env->NewObjectArray(kind.Count, stringClass, empty);
+    env->DeleteLocalRef(stringClass);
     if (result == nullptr) {
         return nullptr;
     }
-    env->DeleteLocalRef(empty);
-    env->DeleteLocalRef(stringClass);
 
     kind.List.BeginEnumeration();
     for (jsize index = 0; index < kind.Count; ++index) {
@@ -198,6 +201,7 @@ jobjectArray BuildStrings(JNIEnv* env, const StringKind<T>& kind) {
         const std::wstring& text = object->*kind.Field;
         jstring value = env->NewString(UTF16Buf, WcharToUnicode(text.c_str()));
         if (value == nullptr) {
+            env->DeleteLocalRef(result);
             return nullptr;
         }
         env->SetObjectArrayElement(result, index, value);

@@ -12,7 +12,7 @@
 #include "com_korvane_sysmgt_tarnova_agent_TarnovaAgent.h"
 #include "diag/hwdebug.h"
 #include "hw/hwinfo.h"
-#include "hwobjects.h"
+#include "model/hwobjects.h"
 #include "setup/linsetup.h"
 #include "sources/linhw.h"
 

@@ -344,6 +344,8 @@ int ReadAdapterFile(FILE* stream) {
 }
 
 int GetAdapterFile() {
+    // Without a card file nothing is declared: an earlier read's adapters are gone with it.
+    FileAdapters.DestroyAll();
     UniqueMalloc<char> path(InstallDirFile(FileName));
     if (path == nullptr) {
         dbgprint("GetAdapterFile(): failed to get path to file\n");

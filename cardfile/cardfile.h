@@ -6,7 +6,7 @@
 #include <cstdio>
 #include <memory>
 
-#include "hwobjects.h"
+#include "model/hwobjects.h"
 
 // Size of the line buffer; a longer line comes in pieces that count as lines of their own.
 constexpr int CARD_LINE_CHARS = 2048;

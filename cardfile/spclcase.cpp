@@ -4,7 +4,7 @@
 #include <cstdint>
 #include <cstring>
 
-#include "hwobjects.h"
+#include "model/hwobjects.h"
 #include "pciconfig.h"
 #include "setup/linsetup.h"
 

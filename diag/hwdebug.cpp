@@ -72,7 +72,13 @@ int FormatWide(wchar_t* out, size_t size, const wchar_t* format, ...) {
     return result;
 }
 
-// Widens a narrow trace format after indent indentation characters and formats it into out.
+bool EndsLine(const wchar_t* text) {
+    const size_t length = std::wcslen(text);
+    return length != 0 && text[length - 1] == L'\n';
+}
+
+// Widens a narrow trace format after indent indentation characters and formats it into out. A
+// text cut to the buffer keeps the line end that its format closes with.
 void FormatNarrow(wchar_t* out, size_t indent, const char* format, va_list arguments) {
     wchar_t wideFormat[CAPACITY];
     if (indent == 0) {
@@ -80,7 +86,10 @@ void FormatNarrow(wchar_t* out, size_t indent, const char* format, va_list argum
     } else {
         MakeWideStringI(format, wideFormat, static_cast<int>(indent));
     }
-    varargs(out, CAPACITY, wideFormat, arguments);
+    if (varargs(out, CAPACITY, wideFormat, arguments) < 0 && EndsLine(wideFormat) &&
+        std::wcslen(out) == CAPACITY - 1) {
+        out[CAPACITY - 2] = L'\n';
+    }
 }
 
 // A composed line of at most CAPACITY - 1 characters. Pieces are cut where the line is full,
@@ -230,14 +239,19 @@ void dbg(const char* function, const char* format, ...) {
     va_start(arguments, format);
     FormatNarrow(text, 0, format, arguments);
     va_end(arguments);
+    // A line cut to the buffer keeps its line end.
+    const bool ended = EndsLine(text);
+    if (ended) {
+        text[std::wcslen(text) - 1] = L'\0';
+    }
     wchar_t wideFunction[CAPACITY];
-    LogLine(0)
+    LogLine(ended ? 1 : 0)
         .Add(_ProgramName)
         .Add(L", ")
         .Add(MakeWideString(function, wideFunction))
         .Add(L":  ")
         .Add(text)
-        .Write(L"");
+        .Write(ended ? L"\n" : L"");
 }
 
 void Enter(int32_t* indent, const char* format, ...) {

@@ -7,7 +7,7 @@
 #include <cstdint>
 
 #include "agentstats.h"
-#include "hwobjects.h"
+#include "model/hwobjects.h"
 
 // Hex and character dump of the bytes start .. start + length - 1 of buffer, perLine a line;
 // the offsets shown are those within buffer.

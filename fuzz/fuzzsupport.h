@@ -11,7 +11,7 @@
 #include <vector>
 
 #include "dbglevel.h"
-#include "hwobjects.h"
+#include "model/hwobjects.h"
 #include "util/sysaccess.h"
 
 // Called, when a target defines it, once <scratch>/inst is the working directory.

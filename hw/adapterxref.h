@@ -3,7 +3,7 @@
 
 #include <cstdint>
 
-#include "hwobjects.h"
+#include "model/hwobjects.h"
 
 // Ties every adapter of AdapterList to its slot and destroys the adapters not kept.
 void XRefSlotAdapter();

@@ -5,7 +5,7 @@
 
 #include "diag/hwdebug.h"
 #include "diag/progname.h"
-#include "hwobjects.h"
+#include "model/hwobjects.h"
 #include "sources/aslpacket.h"
 
 namespace {
@@ -101,6 +101,8 @@ void ReportError(const wchar_t* function) {
 // Stores each valid descriptor as the walk hands it out and collects the strings.
 class AslStorer : public AslVisitor {
   public:
+    explicit AslStorer(const _ASL_PACKET* packet) : Packet(packet) {}
+
     void Visit(const AslDescriptor& descriptor) override {
         const char* trace = ParseTrace(descriptor.ValidType);
         if (trace == nullptr) {
@@ -141,9 +143,9 @@ class AslStorer : public AslVisitor {
         }
     }
 
-    void Stepped(const RAW_ASL_DATA* next) override {
+    void Stepped(uint32_t next) override {
         if (Tracing(TRACE_PARSE)) {
-            dbgprint("StoreAslTable();  next descriptor:  %08x\n", TraceAddress(next));
+            dbgprint("StoreAslTable();  next descriptor:  %08x\n", TraceAddress(Packet) + next);
         }
     }
 
@@ -156,13 +158,14 @@ class AslStorer : public AslVisitor {
     AslStringTable Strings{};
 
   private:
+    const _ASL_PACKET* Packet;
     uint32_t SystemCount = 0;
 };
 
 }  // namespace
 
 void StoreAslTable(const _ASL_PACKET* packet, uint32_t size) {
-    AslStorer storer;
+    AslStorer storer(packet);
     storer.Trace("StoreAslTable():  entry\n");
     if (!IsAslPacket(packet, size)) {
         dbgprint("\n");

@@ -1,7 +1,7 @@
 #include "diag/hwdebug.h"
 #include "diag/progname.h"
 #include "hw/aslstore.h"
-#include "hwobjects.h"
+#include "model/hwobjects.h"
 
 namespace {
 

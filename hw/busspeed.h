@@ -3,7 +3,7 @@
 
 #include <cstdint>
 
-#include "hwobjects.h"
+#include "model/hwobjects.h"
 
 // Sets CurBusSpeed and InPciXMode of every bus from AdapterList.
 void DeriveCurrentBusSpeeds();

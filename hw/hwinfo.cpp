@@ -12,7 +12,7 @@
 #include "hw/adapterxref.h"
 #include "hw/aslstore.h"
 #include "hw/busspeed.h"
-#include "hwobjects.h"
+#include "model/hwobjects.h"
 #include "setup/linsetup.h"
 #include "sources/asldump.h"
 #include "sources/filetabl.h"

@@ -5,7 +5,7 @@
 #include <cstddef>
 #include <cstdint>
 
-#include "hwobjects.h"
+#include "model/hwobjects.h"
 
 constexpr size_t PCI_HEADER_SIZE = 64;
 constexpr size_t PCI_DEVICE_SPECIFIC_SIZE = PCI_CONFIG_SIZE - PCI_HEADER_SIZE;

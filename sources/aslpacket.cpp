@@ -78,15 +78,18 @@ AslWalkEnd WalkAslPacket(const _ASL_PACKET* packet, uint32_t size, AslVisitor& v
         const uint32_t available = limit - offset;
         const bool known = IsFixedType(descriptor.ValidType) || descriptor.ValidType == STRING_TYPE;
 
-        // A known descriptor is checked before anyone reads it; an unknown one is reported by
-        // the visitor before DescriptorSize adds its own message.
-        if (known) {
-            descriptor.Size = DescriptorSize(descriptor.At, available);
-        } else {
+        if (!known) {
+            // The visitor reports the unknown type before DescriptorSize adds its own message.
+            // The walk ends here whatever size the type claims: where it leads is only traced.
             visitor.Visit(descriptor);
             descriptor.Size = DescriptorSize(descriptor.At, available);
+            const bool told = descriptor.Size != ASL_SIZE_PAST_END;
+            visitor.Stepped(offset + (told ? descriptor.Size : available));
+            return AslWalkEnd::UnknownType;
         }
-        if (known && descriptor.Size == 0) {
+        // A known descriptor is checked before anyone reads it.
+        descriptor.Size = DescriptorSize(descriptor.At, available);
+        if (descriptor.Size == 0) {
             ErrMsg("WalkAslPacket()", "Descriptor type 0x%02x at offset %d has length 0",
                    descriptor.Type, offset);
             return AslWalkEnd::Malformed;
@@ -96,11 +99,6 @@ AslWalkEnd WalkAslPacket(const _ASL_PACKET* packet, uint32_t size, AslVisitor& v
                    "Descriptor type 0x%02x at offset %d runs past the %d bytes of the packet",
                    descriptor.Type, offset, limit);
             return AslWalkEnd::Malformed;
-        }
-        if (!known) {
-            offset += descriptor.Size;
-            visitor.Stepped(base + offset);
-            return AslWalkEnd::UnknownType;
         }
 
         RAW_ASL_DATA record[ASL_FIXED_DESCRIPTOR_SIZE] = {};
@@ -113,6 +111,6 @@ AslWalkEnd WalkAslPacket(const _ASL_PACKET* packet, uint32_t size, AslVisitor& v
         }
         visitor.Visit(descriptor);
         offset += descriptor.Size;
-        visitor.Stepped(base + offset);
+        visitor.Stepped(offset);
     }
 }

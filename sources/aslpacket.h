@@ -47,8 +47,9 @@ class AslVisitor {
     virtual ~AslVisitor() = default;
     // Called once per descriptor, also for an unknown type, after which the walk ends.
     virtual void Visit(const AslDescriptor& descriptor) = 0;
-    // The walk has stepped over a descriptor to `next`.
-    virtual void Stepped(const RAW_ASL_DATA* next) { (void)next; }
+    // The walk has stepped over a descriptor to offset `next` of the packet; after an unknown
+    // type, the offset its size leads to, which may lie past the packet.
+    virtual void Stepped(uint32_t next) { (void)next; }
 };
 
 enum class AslWalkEnd {

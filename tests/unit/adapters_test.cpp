@@ -41,6 +41,8 @@ TEST(CapabilityWalk, ReadsKnownItemsWithinTheImageAndDerivesPciX) {
         {Config(4096, 0x10, {{0x34, 0xF8}, {0xF8, 7}, {0xFE, 3}}), 256, 133, 64},
         {Config(256, 0x10, {{0x34, 0x40}, {0x40, 7}}), 0x48, 66, 32},
         {Config(4096, 0x10, {{0x34, 0xF4}, {0xF4, 5}, {0xF6, 0x80}}), 0xF4, 33, 0},
+        {Config(256, 0x10, {{0x34, 0x40}, {0x40, 1}, {0x41, 0xF8}, {0xF8, 5}}), 0xF8, 33, 0},
+        {Config(256, 0x10, {{0x34, 0xFC}, {0xFC, 7}}), 0xFC, 33, 0},
         {Config(256, 0x10, {{0x34, 0x40}, {0x40, 1}, {0x41, 0x40}}), 0x48, 33, 0},  // loop
         {Config(64, 0x10, {{0x34, 0x40}}), 64, 33, 0},
         {Config(63, 0, {}), 0, 33, 0},
@@ -65,6 +67,9 @@ TEST(CapabilityWalk, ReadsKnownItemsWithinTheImageAndDerivesPciX) {
     EXPECT_NE(tree.Log().find("nothing above offset 0x40 (0x00000000)"), std::string::npos);
     EXPECT_NE(tree.Log().find("cut after 48 items"), std::string::npos);
     EXPECT_NE(tree.Log().find("item at 0xf4 reaches past"), std::string::npos);
+    // The end of a 256-byte file cuts an item short: a short read, not an item past the image.
+    EXPECT_TRUE(tree.Logged("ReadCapabilityItem():  item read() failed (0x00000000)"));
+    EXPECT_FALSE(tree.Logged("item at 0xf8"));
 
     // A bridge, by header type or by base class, is not identified by its subsystem registers.
     for (auto [at, value, id] : {std::tuple{0x0E, 0, L"12340000567800ab05"},
@@ -82,8 +87,10 @@ TEST(CapabilityWalk, ReadsKnownItemsWithinTheImageAndDerivesPciX) {
 TEST(ProcBusPci, BusFoldersAndFunctionFiles) {
     _FILE_ATTRIBS entry{};
     uint32_t device = 0, function = 0;
-    for (auto [name, bus] :
-         {std::pair{"1f", 0x1f}, {"0000:00", 0}, {"0000:0a", 10}, {"0000:zz", -1}, {"x1", -1}}) {
+    const std::pair<const char*, int> busses[] = {
+        {"1f", 0x1f},    {"0000:00", 0},  {"0000:0a", 10},  {"0000:zz", 0},
+        {"0e:03", 0x0e}, {"1f:zz", 0x1f}, {"0001:1f.x", 1}, {"x1", -1}};
+    for (auto [name, bus] : busses) {
         std::strcpy(entry.EntryName, name);
         EXPECT_EQ(isBus(&entry, &device) ? static_cast<int>(device) : -1, bus) << name;
     }

@@ -24,9 +24,7 @@ struct Recorder : AslVisitor {
         const uint32_t count = d.ValidType == STRING_TYPE ? d.Size : ASL_FIXED_DESCRIPTOR_SIZE;
         Fields.emplace_back(d.Fields, d.Fields == nullptr ? d.Fields : d.Fields + count);
     }
-    void Stepped(const RAW_ASL_DATA* next) override {
-        Trace += ">" + std::to_string(next - Base) + " ";
-    }
+    void Stepped(uint32_t next) override { Trace += ">" + std::to_string(next) + " "; }
     void Walk(const void* packet, uint32_t size) {
         const AslWalkEnd end = WalkAslPacket(static_cast<const _ASL_PACKET*>(packet), size, *this);
         Trace += end == AslWalkEnd::EndMarker   ? "end"
@@ -102,6 +100,8 @@ TEST(WalkAslPacket, UnknownTypesAndHostilePacketsEndTheWalk) {
          "86@16+16 >32 20@32+0 nofields >33 unknown", ""},
         {AslBuilder().Header().Raw({0x55, 0, 0}).End(), 0, "55@16+0 nofields >16 unknown",
          "\nVELHLIB, DescriptorSize():  Invalid descriptor type: 0x55\n"},
+        {AslBuilder().Header().Raw({'V', 0, 0, 0, 200}).End(), 0, "56@16+0 nofields >216 unknown",
+         ""},
         // A zero Length would step on the same place for ever.
         {AslBuilder().Header().Chassis(0, 0).Bus({1}).Length(0).End(), 0, "86@16+16 >32 malformed",
          head + "Descriptor type 0x81 at offset 32 has length 0\n"},

@@ -7,7 +7,7 @@
 #include "aslbuilder.h"
 #include "diag/hwdebug.h"
 #include "diag/hwdump.h"
-#include "hwobjects.h"
+#include "model/hwobjects.h"
 #include "scratchdir.h"
 
 namespace {

@@ -77,6 +77,9 @@ TEST_F(CardFileTest, EveryReadGivesTheFilesAdaptersAndDeclaredOnesReplaceOrJoinO
         MergeAdapterFile();
         ExpectData("merge", AdapterList);
         EXPECT_EQ(AdapterIndex, 5u);
+        std::filesystem::remove(Tree.InstFile("velhadp.crd"));
+        EXPECT_EQ(GetAdapterFile(), 0);
+        EXPECT_EQ(Describe(FileAdapters), "");
     }
 }
 

@@ -154,12 +154,13 @@ TEST_F(HwDebugTest, WritersLogAsTheDataFileHasIt) {
     Exit(&one, "a\n");
     Exit(nullptr, "plain\n");
     EXPECT_EQ(std::vector({one, two, three, EnterExitIndent}), std::vector({1, 2, 3, 0}));
-    // Long texts are cut to the line buffer; composed lines keep their closing newlines.
+    // Long texts are cut to the line buffer; every line keeps its line end.
     std::wstring text(3000, L'm');
     dbgprint("%s", text.c_str());
+    dbgprint("%s\n", text.c_str());
     ErrMsg("F", "%s", text.c_str());
     LastErr(&error, std::string(2000, 'f').c_str(), "%s", text.c_str());
-    dbg("F", "%s", text.c_str());
+    dbg("F", "%s\n", text.c_str());
 
     // A depth beyond the buffer is cut, not overrun.
     int32_t deep = 100000;

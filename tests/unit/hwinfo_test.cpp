@@ -10,7 +10,7 @@
 #include "aslbuilder.h"
 #include "diag/hwdebug.h"
 #include "fake_driver.h"
-#include "hwobjects.h"
+#include "model/hwobjects.h"
 #include "scratchdir.h"
 #include "setup/linsetup.h"
 #include "util/sysaccess.h"

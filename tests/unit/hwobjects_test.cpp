@@ -2,7 +2,7 @@
 
 #include <vector>
 
-#include "hwobjects.h"
+#include "model/hwobjects.h"
 
 namespace {
 

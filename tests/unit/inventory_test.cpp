@@ -10,7 +10,7 @@
 
 #include "agent/jnilog.h"
 #include "fake_jni.h"
-#include "hwobjects.h"
+#include "model/hwobjects.h"
 #include "scratchdir.h"
 
 namespace {
@@ -65,6 +65,7 @@ TEST_F(InventoryTest, ElementsStayWithinTheArrayAndTheLocalReferencesAndAFailedC
         EXPECT_EQ(c.build(failing.Env()), nullptr);
         EXPECT_TRUE(failing.ExceptionPending);
         EXPECT_EQ(failing.CallsWithException, 0);
+        EXPECT_EQ(failing.LiveLocalRefs, 0);
     }
 }
 

@@ -1,4 +1,4 @@
-#include "hwobjects.h"
+#include "model/hwobjects.h"
 
 #include <cstring>
 
