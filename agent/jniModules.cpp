@@ -1,9 +1,8 @@
-// The fourteen entry points that the agent class declares as native methods. None lets a C++
-// exception reach the JVM, and none raises a Java exception of its own.
+// The fourteen entry points that the agent class declares as native methods. The library is built
+// without C++ exceptions, so none can reach the JVM, and none raises a Java exception of its own.
 #include <jni.h>
 
 #include <cstdint>
-#include <exception>
 #include <string>
 
 #include "agent/inventory.h"
@@ -21,143 +20,101 @@ namespace {
 // The monitor is started once per loaded library; a launch that failed is tried again.
 bool slotwatchRunning = false;
 
-template <typename Result, typename Body>
-Result Guarded(Result failed, Body&& body) noexcept {
-    try {
-        return body();
-    } catch (...) {
-        return failed;
-    }
-}
-
-template <typename Body>
-void Guarded(Body&& body) noexcept {
-    try {
-        body();
-    } catch (...) {
-    }
-}
-
-// The lists must be counted whatever became of the acquisition.
-void RunAcquisition() {
-    try {
-        GetHwInfo();
-    } catch (const std::exception& error) {
-        ErrMsg("getHwInfoReady", "acquisition stopped: %s\n",
-               MakeWideString(error.what(), WideBuffer));
-    } catch (...) {
-        ErrMsg("getHwInfoReady", "acquisition stopped\n");
-    }
-}
-
 }  // namespace
 
 JNIEXPORT void JNICALL
 Java_com_korvane_sysmgt_tarnova_agent_TarnovaAgent_getDebugFileReady(JNIEnv*, jobject) {
-    Guarded([] {
-        if (JniLogOpen()) {
-            JniLog("getDebugFileReady() ...... \n");
-        }
-    });
+    if (JniLogOpen()) {
+        JniLog("getDebugFileReady() ...... \n");
+    }
 }
 
 JNIEXPORT void JNICALL Java_com_korvane_sysmgt_tarnova_agent_TarnovaAgent_getHwInfoReady(JNIEnv*,
                                                                                          jobject) {
-    Guarded([] {
-        JniLog("\n************************ GetHwInfoReady begining \n");
-        if (!slotwatchRunning && LaunchDetached("slotwatch", nullptr)) {
-            JniLog("slotwatch is launched .... \n");
-            slotwatchRunning = true;
-        }
-        RunAcquisition();
-        JniLog("getHwInfoReady: GetHwInfo() done \n");
-        CountInventories();
-    });
+    JniLog("\n************************ GetHwInfoReady begining \n");
+    if (!slotwatchRunning && LaunchDetached("slotwatch", nullptr)) {
+        JniLog("slotwatch is launched .... \n");
+        slotwatchRunning = true;
+    }
+    GetHwInfo();
+    JniLog("getHwInfoReady: GetHwInfo() done \n");
+    CountInventories();
 }
 
 JNIEXPORT jstring JNICALL
 Java_com_korvane_sysmgt_tarnova_agent_TarnovaAgent_getAgentVersionInv(JNIEnv* env, jobject) {
-    return Guarded<jstring>(nullptr, [env] {
-        const std::string version = NarrowForLog(AGENT_VERSION);
-        JniLog("Agent Version=%s \n", version.c_str());
-        return env->NewStringUTF(version.c_str());
-    });
+    const std::string version = NarrowForLog(AGENT_VERSION);
+    JniLog("Agent Version=%s \n", version.c_str());
+    return env->NewStringUTF(version.c_str());
 }
 
 JNIEXPORT jlong JNICALL Java_com_korvane_sysmgt_tarnova_agent_TarnovaAgent_getAgentNumInv(JNIEnv*,
                                                                                           jobject) {
-    // A check that could not run reports the unknown status rather than success.
-    return Guarded<jlong>(NONE_VALUE, [] {
-        JniLog("getAgentNumInv: Begining \n");
-        uint32_t status = 0;
-        CheckPreRequisites(&status);
-        JniLog("Agent Status=%x \n", static_cast<unsigned int>(status));
-        return static_cast<jlong>(status);
-    });
+    JniLog("getAgentNumInv: Begining \n");
+    uint32_t status = 0;
+    CheckPreRequisites(&status);
+    JniLog("Agent Status=%x \n", static_cast<unsigned int>(status));
+    return static_cast<jlong>(status);
 }
 
 JNIEXPORT void JNICALL Java_com_korvane_sysmgt_tarnova_agent_TarnovaAgent_BlinkCmd(JNIEnv*, jobject,
                                                                                    jlong slot,
                                                                                    jint state) {
-    Guarded([slot, state] {
-        const auto slot32 = static_cast<uint32_t>(slot);
-        const auto state32 = static_cast<uint32_t>(state);
-        HwSetBlinkState(slot32, state32);
-        JniLog("BlinkCmd() slot=%d, state=%d \n", static_cast<int32_t>(slot32),
-               static_cast<int32_t>(state32));
-    });
+    const auto slot32 = static_cast<uint32_t>(slot);
+    const auto state32 = static_cast<uint32_t>(state);
+    HwSetBlinkState(slot32, state32);
+    JniLog("BlinkCmd() slot=%d, state=%d \n", static_cast<int32_t>(slot32),
+           static_cast<int32_t>(state32));
 }
 
 JNIEXPORT void JNICALL Java_com_korvane_sysmgt_tarnova_agent_TarnovaAgent_getReadyToExit(JNIEnv*,
                                                                                          jobject) {
-    Guarded([] {
-        // Only a killall that was started may be reported as stopping the monitor.
-        if (LaunchDetached("killall", "slotwatch")) {
-            JniLog("slotwatch is stopped \n");
-        }
-        JniLog("***************************\n");
-        JniLog("JNI: getReadyToExit() Done \n");
-        JniLog("***************************\n\n\n");
-        JniLogClose();
-    });
+    // Only a killall that was started may be reported as stopping the monitor.
+    if (LaunchDetached("killall", "slotwatch")) {
+        JniLog("slotwatch is stopped \n");
+    }
+    JniLog("***************************\n");
+    JniLog("JNI: getReadyToExit() Done \n");
+    JniLog("***************************\n\n\n");
+    JniLogClose();
 }
 
 JNIEXPORT jobjectArray JNICALL
 Java_com_korvane_sysmgt_tarnova_agent_TarnovaAgent_getBusNumInv(JNIEnv* env, jobject) {
-    return Guarded<jobjectArray>(nullptr, [env] { return BusNumInv(env); });
+    return BusNumInv(env);
 }
 
 JNIEXPORT jobjectArray JNICALL
 Java_com_korvane_sysmgt_tarnova_agent_TarnovaAgent_getSlotNumInv(JNIEnv* env, jobject) {
-    return Guarded<jobjectArray>(nullptr, [env] { return SlotNumInv(env); });
+    return SlotNumInv(env);
 }
 
 JNIEXPORT jobjectArray JNICALL
 Java_com_korvane_sysmgt_tarnova_agent_TarnovaAgent_getSystemNumInv(JNIEnv* env, jobject) {
-    return Guarded<jobjectArray>(nullptr, [env] { return SystemNumInv(env); });
+    return SystemNumInv(env);
 }
 
 JNIEXPORT jobjectArray JNICALL
 Java_com_korvane_sysmgt_tarnova_agent_TarnovaAgent_getAdapterNumInv(JNIEnv* env, jobject) {
-    return Guarded<jobjectArray>(nullptr, [env] { return AdapterNumInv(env); });
+    return AdapterNumInv(env);
 }
 
 JNIEXPORT jobjectArray JNICALL
 Java_com_korvane_sysmgt_tarnova_agent_TarnovaAgent_getSystemNameInv(JNIEnv* env, jobject) {
-    return Guarded<jobjectArray>(nullptr, [env] { return SystemNameInv(env); });
+    return SystemNameInv(env);
 }
 
 JNIEXPORT jobjectArray JNICALL
 Java_com_korvane_sysmgt_tarnova_agent_TarnovaAgent_getAdapterNameInv(JNIEnv* env, jobject) {
-    return Guarded<jobjectArray>(nullptr, [env] { return AdapterNameInv(env); });
+    return AdapterNameInv(env);
 }
 
 JNIEXPORT jobjectArray JNICALL
 Java_com_korvane_sysmgt_tarnova_agent_TarnovaAgent_getAdapterPCIIDInv(JNIEnv* env, jobject) {
-    return Guarded<jobjectArray>(nullptr, [env] { return AdapterPciIdInv(env); });
+    return AdapterPciIdInv(env);
 }
 
 JNIEXPORT jobjectArray JNICALL
 Java_com_korvane_sysmgt_tarnova_agent_TarnovaAgent_getAdapterDriverInv(JNIEnv* env, jobject) {
-    return Guarded<jobjectArray>(nullptr, [env] { return AdapterDriverInv(env); });
+    return AdapterDriverInv(env);
 }

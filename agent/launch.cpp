@@ -11,16 +11,6 @@ namespace {
 // Exit status of the intermediate child when it could not create the program's process.
 constexpr int NO_PROCESS = 1;
 
-// A second fork in the child of a multithreaded process: _Fork runs no fork handlers and is
-// async-signal-safe where the C library has it.
-pid_t ForkInChild() {
-#if defined(__GLIBC__) && (__GLIBC__ > 2 || (__GLIBC__ == 2 && __GLIBC_MINOR__ >= 34))
-    return _Fork();
-#else
-    return fork();
-#endif
-}
-
 }  // namespace
 
 bool LaunchDetached(const char* program, const char* argument) {
@@ -37,7 +27,9 @@ bool LaunchDetached(const char* program, const char* argument) {
         return false;
     }
     if (child == 0) {
-        pid_t grandchild = ForkInChild();
+        // The child has only this thread, and the C library made its own locks usable in it, so
+        // a plain fork is safe here (and the oldest target's C library has no other).
+        pid_t grandchild = fork();
         if (grandchild < 0) {
             _exit(NO_PROCESS);
         }

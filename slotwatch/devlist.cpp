@@ -1,8 +1,8 @@
 #include "slotwatch/devlist.h"
 
+#include <algorithm>
 #include <cstdio>
 #include <cstdlib>
-#include <sstream>
 
 namespace {
 
@@ -12,10 +12,13 @@ constexpr size_t FIXED_FIELDS = 17;
 
 std::vector<std::string> SplitTabs(const std::string& line) {
     std::vector<std::string> fields;
-    std::string field;
-    std::istringstream in(line);
-    while (std::getline(in, field, '\t')) {
-        fields.push_back(field);
+    size_t start = 0;
+    for (size_t tab = line.find('\t'); tab != std::string::npos; tab = line.find('\t', start)) {
+        fields.push_back(line.substr(start, tab - start));
+        start = tab + 1;
+    }
+    if (start < line.size()) {
+        fields.push_back(line.substr(start));
     }
     return fields;
 }
@@ -33,25 +36,46 @@ bool ParseHex(const std::string& text, size_t digits, uint32_t* value) {
     return true;
 }
 
+void AddLine(const std::string& line, DeviceList* list, int* skipped) {
+    std::vector<std::string> fields = SplitTabs(line);
+    PciFunction function;
+    if (fields.size() < 2 || !ParseHex(fields[0], 4, &function.Key) ||
+        !ParseHex(fields[1], 8, &function.VendorDevice)) {
+        if (skipped != nullptr && !line.empty()) {
+            ++*skipped;
+        }
+        return;
+    }
+    if (fields.size() > FIXED_FIELDS) {
+        function.Driver = fields[FIXED_FIELDS];
+    }
+    auto place =
+        std::lower_bound(list->begin(), list->end(), function.Key,
+                         [](const PciFunction& entry, uint32_t key) { return entry.Key < key; });
+    if (place != list->end() && place->Key == function.Key) {
+        *place = function;
+    } else {
+        list->insert(place, function);
+    }
+}
+
 }  // namespace
 
-DeviceList ParseDeviceList(std::istream& in, int* skipped) {
+DeviceList ParseDeviceList(std::FILE* in, int* skipped) {
     DeviceList list;
     std::string line;
-    while (std::getline(in, line)) {
-        std::vector<std::string> fields = SplitTabs(line);
-        PciFunction function;
-        if (fields.size() < 2 || !ParseHex(fields[0], 4, &function.Key) ||
-            !ParseHex(fields[1], 8, &function.VendorDevice)) {
-            if (skipped != nullptr && !line.empty()) {
-                ++*skipped;
-            }
-            continue;
+    char chunk[256];
+    while (std::fgets(chunk, sizeof chunk, in) != nullptr) {
+        line += chunk;
+        if (line.back() != '\n') {
+            continue;  // the rest of a long line follows, or the file ends without a newline
         }
-        if (fields.size() > FIXED_FIELDS) {
-            function.Driver = fields[FIXED_FIELDS];
-        }
-        list[function.Key] = function;
+        line.pop_back();
+        AddLine(line, &list, skipped);
+        line.clear();
+    }
+    if (!line.empty()) {
+        AddLine(line, &list, skipped);
     }
     return list;
 }
@@ -73,16 +97,16 @@ std::vector<std::string> DiffDeviceLists(const DeviceList& before, const DeviceL
     auto old = before.begin();
     auto now = after.begin();
     while (old != before.end() || now != after.end()) {
-        if (now == after.end() || (old != before.end() && old->first < now->first)) {
-            changes.push_back("removed " + DescribeFunction(old->second));
+        if (now == after.end() || (old != before.end() && old->Key < now->Key)) {
+            changes.push_back("removed " + DescribeFunction(*old));
             ++old;
-        } else if (old == before.end() || now->first < old->first) {
-            changes.push_back("added " + DescribeFunction(now->second));
+        } else if (old == before.end() || now->Key < old->Key) {
+            changes.push_back("added " + DescribeFunction(*now));
             ++now;
         } else {
-            if (!(old->second == now->second)) {
-                changes.push_back("changed " + DescribeFunction(old->second) + " -> " +
-                                  DescribeFunction(now->second));
+            if (!(*old == *now)) {
+                changes.push_back("changed " + DescribeFunction(*old) + " -> " +
+                                  DescribeFunction(*now));
             }
             ++old;
             ++now;

@@ -3,8 +3,7 @@
 #pragma once
 
 #include <cstdint>
-#include <istream>
-#include <map>
+#include <cstdio>
 #include <string>
 #include <vector>
 
@@ -18,10 +17,12 @@ struct PciFunction {
     }
 };
 
-using DeviceList = std::map<uint32_t, PciFunction>;
+// In key order, one entry per key.
+using DeviceList = std::vector<PciFunction>;
 
-// Reads every well-formed line; malformed lines are skipped and counted in *skipped.
-DeviceList ParseDeviceList(std::istream& in, int* skipped);
+// Reads every well-formed line (a later line of the same key replaces an earlier one); malformed
+// lines are skipped and counted in *skipped.
+DeviceList ParseDeviceList(std::FILE* in, int* skipped);
 
 // "BB:DD.F VVVV:DDDD" with the driver appended when one is bound.
 std::string DescribeFunction(const PciFunction& function);

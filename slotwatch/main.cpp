@@ -6,12 +6,9 @@
 #include <time.h>
 
 #include <cerrno>
-#include <cmath>
 #include <cstdio>
 #include <cstdlib>
 #include <cstring>
-#include <fstream>
-#include <iostream>
 #include <string>
 
 #include "slotwatch/devlist.h"
@@ -31,10 +28,12 @@ struct Options {
     bool Once = false;
 };
 
-void Usage(std::ostream& out) {
-    out << "usage: slotwatch [--devices FILE] [--log FILE] [--interval SECONDS] [--once]\n"
-           "  Watches the PCI device list and logs functions that appear, disappear or change\n"
-           "  driver. --once prints the present functions and exits.\n";
+void Usage() {
+    std::fputs(
+        "usage: slotwatch [--devices FILE] [--log FILE] [--interval SECONDS] [--once]\n"
+        "  Watches the PCI device list and logs functions that appear, disappear or change\n"
+        "  driver. --once prints the present functions and exits.\n",
+        stderr);
 }
 
 bool ParseOptions(int argc, char** argv, Options* options) {
@@ -51,11 +50,11 @@ bool ParseOptions(int argc, char** argv, Options* options) {
             char* end = nullptr;
             options->Interval = std::strtod(argv[++i], &end);
             if (*end != '\0' || !(options->Interval >= 0.01 && options->Interval <= 3600)) {
-                std::cerr << "slotwatch: interval must be between 0.01 and 3600 seconds\n";
+                std::fputs("slotwatch: interval must be between 0.01 and 3600 seconds\n", stderr);
                 return false;
             }
         } else {
-            Usage(std::cerr);
+            Usage();
             return false;
         }
     }
@@ -70,22 +69,23 @@ void LogLine(const Options& options, const std::string& text) {
         strftime(stamp, sizeof stamp, "%Y-%m-%dT%H:%M:%S", &local);
     }
     // Opened per line so that nothing waits in a buffer and a rotated log is picked up.
-    std::ofstream log(options.Log, std::ios::app);
-    if (log) {
-        log << stamp << ' ' << text << '\n';
+    if (std::FILE* log = std::fopen(options.Log.c_str(), "a")) {
+        std::fprintf(log, "%s %s\n", stamp, text.c_str());
+        std::fclose(log);
     } else {
-        std::cerr << "slotwatch: " << stamp << ' ' << text << '\n';
+        std::fprintf(stderr, "slotwatch: %s %s\n", stamp, text.c_str());
     }
 }
 
 bool ReadDevices(const Options& options, DeviceList* list, std::string* error) {
-    std::ifstream in(options.Devices);
-    if (!in) {
+    std::FILE* in = std::fopen(options.Devices.c_str(), "r");
+    if (in == nullptr) {
         *error = options.Devices + ": " + std::strerror(errno);
         return false;
     }
     int skipped = 0;
     *list = ParseDeviceList(in, &skipped);
+    std::fclose(in);
     if (skipped > 0) {
         *error = options.Devices + ": " + std::to_string(skipped) + " malformed line(s) skipped";
     }
@@ -95,7 +95,7 @@ bool ReadDevices(const Options& options, DeviceList* list, std::string* error) {
 void Pause(double seconds) {
     struct timespec delay {};
     delay.tv_sec = static_cast<time_t>(seconds);
-    delay.tv_nsec = static_cast<long>((seconds - std::floor(seconds)) * 1e9);
+    delay.tv_nsec = static_cast<long>((seconds - static_cast<double>(delay.tv_sec)) * 1e9);
     // A stop signal interrupts the sleep, so the monitor ends promptly.
     nanosleep(&delay, nullptr);
 }
@@ -147,11 +147,11 @@ int main(int argc, char** argv) {
         DeviceList list;
         std::string error;
         if (!ReadDevices(options, &list, &error)) {
-            std::cerr << "slotwatch: " << error << '\n';
+            std::fprintf(stderr, "slotwatch: %s\n", error.c_str());
             return 1;
         }
-        for (const auto& entry : list) {
-            std::cout << DescribeFunction(entry.second) << '\n';
+        for (const PciFunction& function : list) {
+            std::printf("%s\n", DescribeFunction(function).c_str());
         }
         return 0;
     }

@@ -22,11 +22,15 @@ std::string Line(const char* key, const char* ids, const char* driver = nullptr)
 }
 
 pid_t Start(std::vector<const char*> args) {
-    args.insert(args.begin(), "slotwatch");
+    args.insert(args.begin(), SLOTWATCH_BINARY);
+#ifdef SLOTWATCH_EMULATOR
+    // A 32-bit build's monitor runs under the tests' own emulator, whatever the kernel can run.
+    args.insert(args.begin(), SLOTWATCH_EMULATOR);
+#endif
     args.push_back(nullptr);
     pid_t child = fork();
     if (child == 0) {
-        execv(SLOTWATCH_BINARY, const_cast<char**>(args.data()));
+        execv(args[0], const_cast<char**>(args.data()));
         _exit(127);
     }
     return child;
