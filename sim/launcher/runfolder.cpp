@@ -161,8 +161,29 @@ bool PrepareRunFolder(const std::string& machine, const std::string& run,
     return MakeFolder(JoinPath(run, "install"), error) && MakeFolder(JoinPath(run, "log"), error);
 }
 
+namespace {
+
+// The working folders of the processes that this user can see: a run still going has its
+// command in RUN/install.
+std::vector<fs::path> WorkingFolders() {
+    std::vector<fs::path> folders;
+    std::error_code code;
+    for (fs::directory_iterator entries("/proc", code), end; !code && entries != end;
+         entries.increment(code)) {
+        std::error_code unreadable;
+        const fs::path folder = fs::read_symlink(entries->path() / "cwd", unreadable);
+        if (!unreadable) {
+            folders.push_back(folder);
+        }
+    }
+    return folders;
+}
+
+}  // namespace
+
 std::vector<std::string> RemoveRunFolders(std::string* error) {
     std::vector<std::string> removed;
+    const std::vector<fs::path> busy = WorkingFolders();
     std::error_code code;
     const std::string base = TemporaryFolder();
     for (fs::directory_iterator entries(base, code), end; !code && entries != end;
@@ -172,6 +193,13 @@ std::vector<std::string> RemoveRunFolders(std::string* error) {
         // Only the folders of this user that velhsim made: its name pattern, no symbolic link.
         if (path.filename().string().rfind(RUN_FOLDER_PREFIX, 0) != 0 ||
             lstat(path.c_str(), &info) != 0 || !S_ISDIR(info.st_mode) || info.st_uid != getuid()) {
+            continue;
+        }
+        bool inUse = false;
+        for (const fs::path& folder : busy) {
+            inUse = inUse || IsInside(folder, path);
+        }
+        if (inUse) {
             continue;
         }
         // A run may leave folders without write permission, which would keep their files.

@@ -17,8 +17,9 @@ constexpr const char* RUN_FOLDER_PREFIX = "velhsim.";
 // A fresh folder under $TMPDIR (or /tmp); empty on failure with the reason.
 std::string MakeTemporaryRunFolder(std::string* error);
 
-// Removes the run folders that velhsim made under $TMPDIR (or /tmp) and this user owns; returns
-// their paths. On a failure the reason is in `error` and the folders removed so far are returned.
+// Removes the run folders that velhsim made under $TMPDIR (or /tmp) and this user owns, but for
+// those in which a process works (a run still going); returns their paths. On a failure the reason
+// is in `error` and the folders removed so far are returned.
 std::vector<std::string> RemoveRunFolders(std::string* error);
 
 // Copies the machine into `run` and builds there what the machine gives in readable form:

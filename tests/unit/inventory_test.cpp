@@ -133,6 +133,8 @@ TEST(WcharToUnicodeTest, DecodesUtf8AndHandsOverOtherTextAsItIs) {
         {L"\xF4\x90\x80\x80", u"\u00F4\u0090\u0080\u0080"},  // past U+10FFFF
         {a99 + smile, std::u16string(99, u'a') + u"\U0001F600"},
         {a99 + L"a" + smile, std::u16string(100, u'a')},
+        {L"\xEF\xBF\xBF", u"\uFFFF"},  // the last character of one unit
+        {L"\xFC" + a99 + L"a", u"\u00FC" + std::u16string(99, u'a')},
     };
     for (const auto& c : cases) {
         const int units = WcharToUnicode(c.text.c_str());

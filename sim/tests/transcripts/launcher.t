@@ -32,7 +32,7 @@ $ unshare --user --map-root-user sh -c 'echo 0 > /proc/sys/user/max_mnt_namespac
 velhsim: cannot create a private mount namespace: No space left on device (a namespace limit has been reached (user.max_user_namespaces or user.max_mnt_namespaces))
 125
 # Its help; a machine that cannot be copied, where the failure names the file; and --clean,
-# which removes velhsim's own run folders and nothing else.
+# which removes velhsim's own run folders, but for one in use, and nothing else.
 $ $VELHSIM --help; echo $?
 usage: velhsim [--i386] --machine DIR [--run-dir RUN] -- COMMAND [ARG...]
        velhsim --clean | --help
@@ -44,11 +44,12 @@ earlier runs left in $TMPDIR or /tmp.
 $ mkdir m2 && mkfifo m2/pipe && $VELHSIM --machine m2 --run-dir e -- true 2>&1; echo $?
 velhsim: cannot copy SCRATCH/m2/pipe to SCRATCH/e/pipe: not a file, folder or symbolic link
 125
-$ mkdir -p t/velhsim.x1/install/sub t/kept && touch t/velhsim.x2 && chmod 555 t/velhsim.x1/install && TMPDIR=$PWD/t $VELHSIM --clean; echo $?; ls t
+$ mkdir -p t/velhsim.x1/install/sub t/velhsim.x3 t/kept && touch t/velhsim.x2 && chmod 555 t/velhsim.x1/install && (cd t/velhsim.x3 && sleep 5 & sleep 1; TMPDIR=$PWD/t $VELHSIM --clean); echo $?; ls t
 velhsim: removed SCRATCH/t/velhsim.x1
 0
 kept
 velhsim.x2
+velhsim.x3
 $ ls
 a
 b

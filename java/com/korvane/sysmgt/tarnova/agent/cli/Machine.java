@@ -397,6 +397,11 @@ public final class Machine {
         public List<Card> cards() {
             return Collections.unmodifiableList(cards);
         }
+
+        /** The card in the slot (the first, should the inventory place two), or null. */
+        public Card card() {
+            return cards.isEmpty() ? null : cards.get(0);
+        }
     }
 
     /** One card, or one on-board device: its PCI functions, lowest function first. */
