@@ -47,7 +47,7 @@ constexpr int MAX_VERSION_FIELDS = 16;
 
 // The OS has not been identified yet.
 bool doOneTime = true;
-// The driver has been asked once whether it hands out a table.
+// The driver has handed out its table once.
 bool checkedASL = false;
 
 bool Tracing() {
@@ -165,7 +165,8 @@ uint32_t PreReqCode() {
     return PREREQ_OK;
 }
 
-// Asks the driver once per library lifetime whether it hands out a table.
+// Asks the driver whether it hands out a table, until it has done so once: a read that failed
+// (the device busy, no memory) would otherwise count as no table for the library's lifetime.
 void CheckAslTable() {
     std::unique_ptr<_ASL_PACKET> scratch(new (std::nothrow) _ASL_PACKET);
     if (!scratch) {
@@ -174,7 +175,7 @@ void CheckAslTable() {
         return;
     }
     AslTableAvailable = GetAslTable(scratch.get()) != 0;
-    checkedASL = true;
+    checkedASL = AslTableAvailable;
 }
 
 // Converts one version field; a missing field counts as 0.
@@ -211,9 +212,11 @@ void InitCheckPreReqs() {
     DriverLoaded = false;
     DriverVerValid = false;
 
+    // Identified once; an identification that found no supported distribution or no kernel
+    // release (uname failed, the release file could not be read) is tried again.
     if (doOneTime) {
         IdentifyOS();
-        doOneTime = false;
+        doOneTime = !SupportedOsProduct || KernVersion == nullptr || KernVersion[0] == '\0';
     }
     if (!ValidVPD) {
         GetVPD(&Vpd);

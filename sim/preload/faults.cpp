@@ -17,8 +17,9 @@ namespace velhsim {
 
 namespace {
 
-constexpr const char* KIND_NAMES[] = {"driver", "query_module", "module_growth", "uname", "getcwd",
-                                      "scandir", "fork", "exec", "short", "partial"};
+constexpr const char* KIND_NAMES[] = {"driver", "query_module", "module_growth", "uname",
+                                      "getcwd", "scandir",      "fork",          "exec",
+                                      "short",  "partial"};
 static_assert(std::size(KIND_NAMES) == static_cast<size_t>(FaultKind::Count));
 
 constexpr const char* LIBRARY_NAME = "libvelhlib";
@@ -139,8 +140,8 @@ bool FromLibrary(const void* caller) {
         return false;
     }
     dl_find_object found{};
-    if (_dl_find_object(const_cast<void*>(caller), &found) != 0 ||
-        found.dlfo_link_map == nullptr || found.dlfo_link_map->l_name == nullptr) {
+    if (_dl_find_object(const_cast<void*>(caller), &found) != 0 || found.dlfo_link_map == nullptr ||
+        found.dlfo_link_map->l_name == nullptr) {
         return false;
     }
     const char* name = found.dlfo_link_map->l_name;

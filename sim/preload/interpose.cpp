@@ -97,7 +97,8 @@ int OpenAt(int dirfd, const char* path, int flags, int mode, const void* caller)
     } else {
         static const OpenAtFunction real = NextSymbol<OpenAtFunction>("openat");
         fd = real(dirfd, path, flags, mode);
-        const int half = fd >= 0 && velhsim::FromLibrary(caller) ? ShortCopy(fd, flags, caller) : -1;
+        const int half =
+            fd >= 0 && velhsim::FromLibrary(caller) ? ShortCopy(fd, flags, caller) : -1;
         if (half >= 0) {
             close(fd);
             fd = half;
@@ -283,7 +284,8 @@ using Dirent64Filter = int (*)(const struct dirent64*);
 using Dirent64Compare = int (*)(const struct dirent64**, const struct dirent64**);
 VELHSIM_HOOK int scandir64(const char* directory, struct dirent64*** list, Dirent64Filter filter,
                            Dirent64Compare compare) {
-    using ScandirFunction = int (*)(const char*, struct dirent64***, Dirent64Filter, Dirent64Compare);
+    using ScandirFunction =
+        int (*)(const char*, struct dirent64***, Dirent64Filter, Dirent64Compare);
     static const ScandirFunction real = NextSymbol<ScandirFunction>("scandir64");
     if (velhsim::CallFails(velhsim::FaultKind::Scandir, __builtin_return_address(0))) {
         errno = ENOMEM;
@@ -314,8 +316,7 @@ VELHSIM_HOOK int execlp(const char* file, const char* argument, ...) noexcept {
     size_t count = 1;
     va_list rest;
     va_start(rest, argument);
-    while (count < MAX_ARGUMENTS &&
-           (arguments[count] = va_arg(rest, const char*)) != nullptr) {
+    while (count < MAX_ARGUMENTS && (arguments[count] = va_arg(rest, const char*)) != nullptr) {
         ++count;
     }
     va_end(rest);
