@@ -9,6 +9,7 @@
 #include "adapters/pciname.h"
 #include "diag/hwdebug.h"
 #include "hwobjects.h"
+#include "util/heap.h"
 #include "util/parstool.h"
 #include "util/sysaccess.h"
 
@@ -50,7 +51,10 @@ bool AddAdapter(const char* path, uint32_t busNum, uint32_t device, uint32_t fun
     if (length == 0) {
         return false;
     }
-    auto adapter = std::make_unique<AdapterDescriptor>();
+    std::unique_ptr<AdapterDescriptor> adapter = NewObject<AdapterDescriptor>("GetAdapterInfo()");
+    if (adapter == nullptr) {
+        return false;
+    }
     adapter->AdapterID = AdapterIndex;
     adapter->Bus = busNum;
     adapter->Device = device;

@@ -16,6 +16,7 @@
 #include "sources/linhw.h"
 #include "sources/pcifile.h"
 #include "util/enumdir.h"
+#include "util/heap.h"
 #include "util/parstool.h"
 #include "util/sysaccess.h"
 
@@ -300,12 +301,12 @@ char* GetField(char** cursor, char separator) {
 
 int VerCompare(const char* version1, const char* version2, int fields) {
     int count = std::clamp(fields, 0, MAX_VERSION_FIELDS);
-    UniqueMalloc<char> copy1(strdup(version1 != nullptr ? version1 : ""));
+    UniqueMalloc<char> copy1(HeapStrdup(version1 != nullptr ? version1 : ""));
     if (!copy1) {
         LastErr(nullptr, "VerCompare()", "ver1 malloc() failed");
         return -2;
     }
-    UniqueMalloc<char> copy2(strdup(version2 != nullptr ? version2 : ""));
+    UniqueMalloc<char> copy2(HeapStrdup(version2 != nullptr ? version2 : ""));
     if (!copy2) {
         LastErr(nullptr, "VerCompare()", "ver2 malloc() failed");
         return -2;
