@@ -244,7 +244,7 @@ bool CompleteRecord() {
     Pending().OnBoard = false;
     const bool added =
         AddOrReport(FileAdapters, std::move(CardDesc), "GetAdapterFile()") != nullptr;
-    CardDesc.reset();
+    CardDesc = NewCard();
     return added;
 }
 
@@ -290,8 +290,9 @@ int ParseLine(char* line) {
     int completed = 0;
     char* cursor = line;
     while (char* token = GetToken(&cursor)) {
-        // A record completed earlier on the line needs its successor.
-        if (CardDesc == nullptr && (CardDesc = NewCard()) == nullptr) {
+        // Without memory for the next record the rest of the file cannot be read; the records
+        // read stay.
+        if (CardDesc == nullptr) {
             break;
         }
         // The token comes from a line of CARD_LINE_CHARS, so the copy holds all of it.
@@ -332,7 +333,7 @@ int ParseLine(char* line) {
 int ReadAdapterFile(FILE* stream) {
     // FileAdapters owns every descriptor it holds (the merge hands AdapterList copies).
     FileAdapters.DestroyAll();
-    CardDesc.reset();
+    CardDesc = NewCard();
     LineNum = 0;
     ParseState = FIELD_NAME;
     ParseError = 0;
@@ -344,14 +345,9 @@ int ReadAdapterFile(FILE* stream) {
     while (getline(stream, line, CARD_LINE_CHARS)) {
         char* prepared = TrimLine(line);
         LineNum++;
-        if (*prepared == '\0') {
-            continue;
+        if (*prepared != '\0') {
+            count += ParseLine(prepared);
         }
-        // Without memory for a record the rest cannot be read; the records read stay.
-        if (CardDesc == nullptr && (CardDesc = NewCard()) == nullptr) {
-            break;
-        }
-        count += ParseLine(prepared);
     }
     return count;
 }
