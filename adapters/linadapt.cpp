@@ -7,6 +7,7 @@
 #include "adapters/cfgspace.h"
 #include "adapters/moddriver.h"
 #include "adapters/pciname.h"
+#include "diag/checkedalloc.h"
 #include "diag/hwdebug.h"
 #include "model/hwobjects.h"
 #include "util/parstool.h"
@@ -61,7 +62,10 @@ bool AddAdapter(const char* path, uint32_t busNum, uint32_t device, uint32_t fun
     if (length == 0) {
         return false;
     }
-    auto adapter = std::make_unique<AdapterDescriptor>();
+    std::unique_ptr<AdapterDescriptor> adapter = NewObject<AdapterDescriptor>("GetAdapterInfo()");
+    if (adapter == nullptr) {
+        return false;
+    }
     adapter->AdapterID = AdapterIndex;
     adapter->Bus = busNum;
     adapter->Device = device;

@@ -9,6 +9,7 @@
 #include "adapters/modquery.h"
 #include "adapters/pciname.h"
 #include "diag/hwdebug.h"
+#include "runtime/heap.h"
 #include "util/blocklines.h"
 #include "util/parstool.h"
 #include "util/sysaccess.h"
@@ -95,7 +96,7 @@ bool GetDriverName(AdapterDescriptor* adapter) {
         return true;
     }
     size_t searchLength = sizeof MARKER_PREFIX - 1 + std::strlen(module) + sizeof MARKER_SUFFIX - 1;
-    UniqueMalloc<char> search(static_cast<char*>(std::malloc(searchLength + 1)));
+    UniqueMalloc<char> search(static_cast<char*>(HeapMalloc(searchLength + 1)));
     if (!search) {
         LastErr(nullptr, "GetDriverName()", "search string malloc() failed");
         return false;

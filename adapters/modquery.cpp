@@ -6,6 +6,7 @@
 #include <cstring>
 
 #include "diag/hwdebug.h"
+#include "runtime/heap.h"
 #include "util/sysaccess.h"
 
 namespace {
@@ -47,7 +48,7 @@ int GetModuleSymbols(const char* module, ModuleSymbols* symbols) {
     *symbols = ModuleSymbols{};
     int size = SizeBuffer(module, QM_SYMBOLS);
     for (int attempt = 0; size > 0 && attempt < SYMBOL_READ_ATTEMPTS; ++attempt) {
-        UniqueMalloc<char> buffer(static_cast<char*>(std::malloc(static_cast<size_t>(size))));
+        UniqueMalloc<char> buffer(static_cast<char*>(HeapMalloc(static_cast<size_t>(size))));
         if (!buffer) {
             LastErr(nullptr, "GetModuleSymbols()", "locbuf malloc(%d) failed", size);
             return 0;
@@ -86,7 +87,7 @@ bool GetModuleInfo(const char* module, UniqueMalloc<module_info>* info) {
     }
     // A kernel record shorter than ours leaves the rest zero rather than unread memory.
     size_t capacity = std::max(static_cast<size_t>(size), sizeof(module_info));
-    UniqueMalloc<module_info> record(static_cast<module_info*>(std::calloc(1, capacity)));
+    UniqueMalloc<module_info> record(static_cast<module_info*>(HeapCalloc(1, capacity)));
     if (!record) {
         LastErr(nullptr, "GetModuleInfo()", "malloc %d bytes failed\n", size);
         return false;

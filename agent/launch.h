@@ -3,6 +3,6 @@
 
 // Runs program along PATH with argument as its only argument (none when argument is null) and
 // does not wait for it. The program is detached: it is never left behind as a zombie child of
-// this process. Returns false when no process could be created for it; a program that cannot be
-// executed is not detected.
+// this process. Returns once the program runs: false when no process could be created for it or
+// it could not be executed.
 bool LaunchDetached(const char* program, const char* argument);

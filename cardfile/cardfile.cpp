@@ -5,6 +5,7 @@
 #include <initializer_list>
 #include <string>
 
+#include "diag/checkedalloc.h"
 #include "diag/hwdebug.h"
 #include "diag/linport.h"
 #include "filehandle.h"
@@ -63,11 +64,13 @@ const FieldMessage FieldMessages[] = {
      false},
 };
 
+// The record being read; ParseLine has made sure that there is one.
 AdapterDescriptor& Pending() {
-    if (CardDesc == nullptr) {
-        CardDesc = std::make_unique<AdapterDescriptor>();
-    }
     return *CardDesc;
+}
+
+std::unique_ptr<AdapterDescriptor> NewCard() {
+    return NewObject<AdapterDescriptor>("GetAdapterFile()");
 }
 
 // The number that the trimmed token spells when it is one of the accepted texts; 0 otherwise.
@@ -239,8 +242,9 @@ void HandleName(char* token, bool isName, char* written) {
 // Hands the complete pending record to FileAdapters; whether it could be added.
 bool CompleteRecord() {
     Pending().OnBoard = false;
-    const bool added = AddOwned(FileAdapters, std::move(CardDesc)) != nullptr;
-    CardDesc = std::make_unique<AdapterDescriptor>();
+    const bool added =
+        AddOrReport(FileAdapters, std::move(CardDesc), "GetAdapterFile()") != nullptr;
+    CardDesc = NewCard();
     return added;
 }
 
@@ -286,6 +290,11 @@ int ParseLine(char* line) {
     int completed = 0;
     char* cursor = line;
     while (char* token = GetToken(&cursor)) {
+        // Without memory for the next record the rest of the file cannot be read; the records
+        // read stay.
+        if (CardDesc == nullptr) {
+            break;
+        }
         // The token comes from a line of CARD_LINE_CHARS, so the copy holds all of it.
         char written[CARD_LINE_CHARS];
         std::snprintf(written, sizeof written, "%s", token);
@@ -324,7 +333,7 @@ int ParseLine(char* line) {
 int ReadAdapterFile(FILE* stream) {
     // FileAdapters owns every descriptor it holds (the merge hands AdapterList copies).
     FileAdapters.DestroyAll();
-    CardDesc = std::make_unique<AdapterDescriptor>();
+    CardDesc = NewCard();
     LineNum = 0;
     ParseState = FIELD_NAME;
     ParseError = 0;
@@ -387,9 +396,13 @@ void MergeAdapterFile() {
             *target = *declared;
             continue;
         }
+        std::unique_ptr<AdapterDescriptor> copy =
+            NewObject<AdapterDescriptor>("MergeAdapterFile()");
+        if (copy == nullptr) {
+            continue;
+        }
         declared->AdapterID = AdapterIndex++;
-        auto copy = std::make_unique<AdapterDescriptor>();
         *copy = *declared;
-        AddOwned(AdapterList, std::move(copy));
+        AddOrReport(AdapterList, std::move(copy), "MergeAdapterFile()");
     }
 }

@@ -3,6 +3,7 @@
 #include <memory>
 #include <utility>
 
+#include "diag/checkedalloc.h"
 #include "diag/hwdebug.h"
 #include "diag/progname.h"
 #include "model/hwobjects.h"
@@ -59,7 +60,7 @@ int StoreSystem(std::unique_ptr<SystemDescriptor> system, const char* title) {
         dbgprint("    desc->ExpnDrawer:  %s\n", BoolText(system->ExpnDrawer != 0));
         dbgprint("\n");
     }
-    AddOwned(SystemList, std::move(system));
+    AddOrReport(SystemList, std::move(system), "StoreAslTable()");
     return 0;
 }
 
@@ -188,7 +189,10 @@ void StoreAslTable(const _ASL_PACKET* packet, uint32_t size) {
 }
 
 int StoreChassisDescriptor(const _ASL_CHASSIS_DESCRIPTOR* descriptor, uint32_t systemIndex) {
-    auto system = std::make_unique<SystemDescriptor>();
+    std::unique_ptr<SystemDescriptor> system = NewObject<SystemDescriptor>("StoreAslTable()");
+    if (system == nullptr) {
+        return 0;
+    }
     system->SystemID = systemIndex;
     system->ChassisNum = descriptor->ChassisID;
     system->DrawerNum = NONE_BYTE;
@@ -198,7 +202,10 @@ int StoreChassisDescriptor(const _ASL_CHASSIS_DESCRIPTOR* descriptor, uint32_t s
 }
 
 int StoreDrawerDescriptor(const _ASL_DRAWER_DESCRIPTOR* descriptor, uint32_t systemIndex) {
-    auto system = std::make_unique<SystemDescriptor>();
+    std::unique_ptr<SystemDescriptor> system = NewObject<SystemDescriptor>("StoreAslTable()");
+    if (system == nullptr) {
+        return 0;
+    }
     system->SystemID = systemIndex;
     system->ChassisNum = NONE_BYTE;
     system->DrawerNum = descriptor->DrawerID;
@@ -208,7 +215,10 @@ int StoreDrawerDescriptor(const _ASL_DRAWER_DESCRIPTOR* descriptor, uint32_t sys
 }
 
 int StoreBusDescriptor(const _ASL_BUS_DESCRIPTOR* descriptor) {
-    auto bus = std::make_unique<BusDescriptor>();
+    std::unique_ptr<BusDescriptor> bus = NewObject<BusDescriptor>("StoreAslTable()");
+    if (bus == nullptr) {
+        return 0;
+    }
     bus->BusID = descriptor->BusID;
     bus->ChassisNum = descriptor->ChassisID;
     bus->DrawerNum = descriptor->DrawerID;
@@ -250,12 +260,15 @@ int StoreBusDescriptor(const _ASL_BUS_DESCRIPTOR* descriptor) {
         dbgprint("         desc->SlotCt initialized to 0x%08x\n", bus->SlotCt);
         dbgprint("\n");
     }
-    AddOwned(BusList, std::move(bus));
+    AddOrReport(BusList, std::move(bus), "StoreAslTable()");
     return 0;
 }
 
 int StoreSlotDescriptor(const _ASL_SLOT_DESCRIPTOR* descriptor) {
-    auto slot = std::make_unique<SlotDescriptor>();
+    std::unique_ptr<SlotDescriptor> slot = NewObject<SlotDescriptor>("StoreAslTable()");
+    if (slot == nullptr) {
+        return 0;
+    }
     const uint8_t attrib1 = descriptor->Attrib1;
     slot->SlotID = descriptor->SlotID;
     slot->BusID = descriptor->BusID;
@@ -297,6 +310,6 @@ int StoreSlotDescriptor(const _ASL_SLOT_DESCRIPTOR* descriptor) {
         dbgprint("         desc->LowProfile:  %s\n", BoolText(slot->LowProfile));
         dbgprint("\n");
     }
-    AddOwned(SlotList, std::move(slot));
+    AddOrReport(SlotList, std::move(slot), "StoreAslTable()");
     return 0;
 }

@@ -7,6 +7,7 @@
 #include "asl.h"
 #include "cardfile/cardfile.h"
 #include "cardfile/spclcase.h"
+#include "diag/checkedalloc.h"
 #include "diag/hwdebug.h"
 #include "diag/hwdump.h"
 #include "hw/adapterxref.h"
@@ -73,7 +74,11 @@ bool GetHwInfo() {
     SetupVelhSlot();
 
     // Both sources write into this one buffer; it lives for this call only.
-    auto packet = std::make_unique<_ASL_PACKET>();
+    std::unique_ptr<_ASL_PACKET> packet = NewObject<_ASL_PACKET>("GetHwInfo()");
+    if (packet == nullptr) {
+        StopHwInfo();
+        return false;
+    }
     TraceAcquire("GetHwInfo():  getting table from file\n");
     uint32_t size = GetFileTable(packet.get(), ASL_PACKET_CAPACITY);
     const bool fileTable = size != 0;

@@ -13,6 +13,7 @@
 #include "diag/hwdebug.h"
 #include "diag/hwdump.h"
 #include "filehandle.h"
+#include "runtime/heap.h"
 #include "sources/linhw.h"
 #include "sources/pcifile.h"
 #include "util/enumdir.h"
@@ -47,7 +48,7 @@ constexpr int MAX_VERSION_FIELDS = 16;
 
 // The OS has not been identified yet.
 bool doOneTime = true;
-// The driver has been asked once whether it hands out a table.
+// The driver has handed out its table once.
 bool checkedASL = false;
 
 bool Tracing() {
@@ -165,7 +166,8 @@ uint32_t PreReqCode() {
     return PREREQ_OK;
 }
 
-// Asks the driver once per library lifetime whether it hands out a table.
+// Asks the driver whether it hands out a table, until it has done so once: a read that failed
+// (the device busy, no memory) would otherwise count as no table for the library's lifetime.
 void CheckAslTable() {
     std::unique_ptr<_ASL_PACKET> scratch(new (std::nothrow) _ASL_PACKET);
     if (!scratch) {
@@ -174,7 +176,7 @@ void CheckAslTable() {
         return;
     }
     AslTableAvailable = GetAslTable(scratch.get()) != 0;
-    checkedASL = true;
+    checkedASL = AslTableAvailable;
 }
 
 // Converts one version field; a missing field counts as 0.
@@ -211,9 +213,11 @@ void InitCheckPreReqs() {
     DriverLoaded = false;
     DriverVerValid = false;
 
+    // Identified once; an identification that found no supported distribution or no kernel
+    // release (uname failed, the release file could not be read) is tried again.
     if (doOneTime) {
         IdentifyOS();
-        doOneTime = false;
+        doOneTime = !SupportedOsProduct || KernVersion == nullptr || KernVersion[0] == '\0';
     }
     if (!ValidVPD) {
         GetVPD(&Vpd);
@@ -297,12 +301,12 @@ char* GetField(char** cursor, char separator) {
 
 int VerCompare(const char* version1, const char* version2, int fields) {
     int count = std::clamp(fields, 0, MAX_VERSION_FIELDS);
-    UniqueMalloc<char> copy1(strdup(version1 != nullptr ? version1 : ""));
+    UniqueMalloc<char> copy1(HeapStrdup(version1 != nullptr ? version1 : ""));
     if (!copy1) {
         LastErr(nullptr, "VerCompare()", "ver1 malloc() failed");
         return -2;
     }
-    UniqueMalloc<char> copy2(strdup(version2 != nullptr ? version2 : ""));
+    UniqueMalloc<char> copy2(HeapStrdup(version2 != nullptr ? version2 : ""));
     if (!copy2) {
         LastErr(nullptr, "VerCompare()", "ver2 malloc() failed");
         return -2;

@@ -11,6 +11,8 @@
 #include <emmintrin.h>
 #endif
 
+#include "runtime/heap.h"
+
 namespace {
 
 // Few system calls per file, and still small enough to stay in the processor's cache while the
@@ -85,7 +87,7 @@ bool BlockLines::Open(const char* path) {
         return false;
     }
     if (!Buffer) {
-        Buffer.reset(static_cast<char*>(std::malloc(BLOCK_BYTES + 1)));
+        Buffer.reset(static_cast<char*>(HeapMalloc(BLOCK_BYTES + 1)));
         if (!Buffer) {
             File.Reset();
             errno = ENOMEM;

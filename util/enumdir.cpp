@@ -9,6 +9,7 @@
 
 #include "diag/hwdebug.h"
 #include "filehandle.h"
+#include "runtime/heap.h"
 
 namespace {
 
@@ -111,13 +112,13 @@ bool EnumDir::StartEnum(const char* directory, const char* pattern, uint32_t mas
     NameList = list;
     NameCount = count;
 
-    Directory = strdup(directory);
+    Directory = HeapStrdup(directory);
     if (Directory == nullptr) {
         LastErr(nullptr, "EnumDir::StartEnum()", "directory malloc() failed");
         ReleaseResources();
         return false;
     }
-    Pattern = strdup(pattern);
+    Pattern = HeapStrdup(pattern);
     if (Pattern == nullptr) {
         LastErr(nullptr, "EnumDir::StartEnum()", "pattern malloc() failed");
         ReleaseResources();
@@ -181,7 +182,7 @@ bool EnumDir::SetAttribs(const char* directory, const dirent64* entry, _FILE_ATT
     size_t dirLength = std::strlen(directory);
     bool needSlash = dirLength == 0 || directory[dirLength - 1] != '/';
     size_t pathSize = dirLength + (needSlash ? 1 : 0) + std::strlen(entry->d_name) + 1;
-    UniqueMalloc<char> path(static_cast<char*>(std::malloc(pathSize)));
+    UniqueMalloc<char> path(static_cast<char*>(HeapMalloc(pathSize)));
     if (path == nullptr) {
         LastErr(nullptr, "EnumDir::SetAttribs()", "fspec malloc() failed");
         return false;

@@ -8,6 +8,7 @@
 
 #include "diag/hwdebug.h"
 #include "filehandle.h"
+#include "runtime/heap.h"
 
 bool GetInstallDir(wchar_t* buffer, int32_t size) {
     if (buffer == nullptr) {
@@ -37,7 +38,7 @@ char* InstallDirFile(const char* name) {
     size_t directoryLength = std::wcslen(directory);
     size_t nameLength = name != nullptr ? std::strlen(name) : 0;
     bool addSlash = nameLength > 0 && name[0] != '/';
-    auto* path = static_cast<char*>(std::malloc(directoryLength + nameLength + (addSlash ? 2 : 1)));
+    auto* path = static_cast<char*>(HeapMalloc(directoryLength + nameLength + (addSlash ? 2 : 1)));
     if (path == nullptr) {
         LastErr(nullptr, "InstallDirFile", "malloc() failed");
         return nullptr;

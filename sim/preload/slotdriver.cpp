@@ -11,6 +11,7 @@
 #include <limits>
 
 #include "sim/common/textfile.h"
+#include "sim/preload/faults.h"
 #include "velhpdrv.h"
 
 namespace velhsim {
@@ -175,13 +176,16 @@ std::optional<int> InjectedFailure(const std::string& run, const std::string& re
     return std::nullopt;
 }
 
-int DriverOpen(const std::string& run, int flags) {
+int DriverOpen(const std::string& run, int flags, const void* caller) {
     if (!IsDirectory(JoinPath(run, "driver"))) {
         return Fail(ENOENT);
     }
     LogRequest(run, "open");
     if (const std::optional<int> error = InjectedFailure(run, "open")) {
         return Fail(*error);
+    }
+    if (CallFails(FaultKind::Driver, caller)) {
+        return Fail(EIO);
     }
     return memfd_create(DEVICE_FILE_NAME, (flags & O_CLOEXEC) != 0 ? MFD_CLOEXEC : 0);
 }
@@ -203,7 +207,7 @@ bool IsDriverDescriptor(int fd) {
     return std::strncmp(target, expected.c_str(), expected.size()) == 0;
 }
 
-int DriverIoctl(const std::string& run, unsigned long request, void* argument) {
+int DriverIoctl(const std::string& run, unsigned long request, void* argument, const void* caller) {
     const char* name = nullptr;
     switch (request) {
         case VELH_IOCTL_VERSION:
@@ -231,6 +235,9 @@ int DriverIoctl(const std::string& run, unsigned long request, void* argument) {
                                       : std::string(name));
     if (const std::optional<int> error = InjectedFailure(run, name)) {
         return Fail(*error);
+    }
+    if (CallFails(FaultKind::Driver, caller)) {
+        return Fail(EIO);
     }
     if (argument == nullptr) {
         return Fail(EFAULT);

@@ -13,11 +13,12 @@
 namespace velhsim {
 
 // Opens the device: a descriptor, or -1 with errno (ENOENT when the machine has no driver).
-int DriverOpen(const std::string& run, int flags);
+// caller is the return address of the hook, for the fault sweep (faults.h).
+int DriverOpen(const std::string& run, int flags, const void* caller);
 // Whether fd is a descriptor that DriverOpen handed out.
 bool IsDriverDescriptor(int fd);
 // One ioctl request on the device: 0, or -1 with errno.
-int DriverIoctl(const std::string& run, unsigned long request, void* argument);
+int DriverIoctl(const std::string& run, unsigned long request, void* argument, const void* caller);
 
 // The errno that driver/fail assigns to the request, if it names it.
 std::optional<int> InjectedFailure(const std::string& run, const std::string& request);

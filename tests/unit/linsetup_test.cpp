@@ -218,11 +218,18 @@ TEST_F(PreReq, PciArchitectureFileReplacesTheDriverOnceVitalProductDataIsFound) 
 }
 
 TEST_F(PreReq, OnceAndEveryCheckFacts) {
+    // A failed uname or table read is not final: the next check asks again.
+    Release = "fail";
+    Driver.FailRequest = VELH_IOCTL_TABLE;
+    EXPECT_EQ(Check(), PREREQ_KERNEL_VERSION);
+    Release = "2.4.19-64GB-SMP";
+    EXPECT_EQ(Check(), PREREQ_NO_ASL_TABLE);
+    Driver.FailRequest = 0;
     EXPECT_EQ(Check(), PREREQ_OK);
     // The table is asked for once per library lifetime.
     Driver.SetTable(0);
     EXPECT_EQ(Check(), PREREQ_OK);
-    EXPECT_EQ(Driver.Count(VELH_IOCTL_TABLE), 1u);
+    EXPECT_EQ(Driver.Count(VELH_IOCTL_TABLE), 3u);
     // The OS is identified once; the driver facts are gathered anew.
     Release = "2.4.18";
     SetRelease("SuSE-release", "RedHat x\n");

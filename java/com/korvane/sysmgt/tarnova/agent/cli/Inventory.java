@@ -24,22 +24,27 @@ public final class Inventory {
         agent.getDebugFileReady();
         try {
             agent.getHwInfoReady();
-            InventoryTable systems = new InventoryTable("systems", InventoryTable.SYSTEM_FIELDS,
-                agent.getSystemNumInv()).withText("Name", agent.getSystemNameInv());
-            InventoryTable busses = new InventoryTable("busses", InventoryTable.BUS_FIELDS,
-                agent.getBusNumInv());
-            InventoryTable slots = new InventoryTable("slots", InventoryTable.SLOT_FIELDS,
-                agent.getSlotNumInv());
-            InventoryTable adapters = new InventoryTable("adapters",
-                InventoryTable.ADAPTER_FIELDS, agent.getAdapterNumInv())
-                .withText("Name", agent.getAdapterNameInv())
-                .withText("PciId", agent.getAdapterPCIIDInv())
-                .withText("Driver", agent.getAdapterDriverInv());
-            return new Inventory(agent.getAgentVersionInv(), agent.getAgentNumInv(), systems,
-                busses, slots, adapters);
+            return read(agent);
         } finally {
             agent.getReadyToExit();
         }
+    }
+
+    /** What the last acquisition found: the eight inventories, version and status. */
+    public static Inventory read(TarnovaAgent agent) {
+        InventoryTable systems = new InventoryTable("systems", InventoryTable.SYSTEM_FIELDS,
+            agent.getSystemNumInv()).withText("Name", agent.getSystemNameInv());
+        InventoryTable busses = new InventoryTable("busses", InventoryTable.BUS_FIELDS,
+            agent.getBusNumInv());
+        InventoryTable slots = new InventoryTable("slots", InventoryTable.SLOT_FIELDS,
+            agent.getSlotNumInv());
+        InventoryTable adapters = new InventoryTable("adapters", InventoryTable.ADAPTER_FIELDS,
+            agent.getAdapterNumInv())
+            .withText("Name", agent.getAdapterNameInv())
+            .withText("PciId", agent.getAdapterPCIIDInv())
+            .withText("Driver", agent.getAdapterDriverInv());
+        return new Inventory(agent.getAgentVersionInv(), agent.getAgentNumInv(), systems, busses,
+            slots, adapters);
     }
 
     public String version() {

@@ -8,7 +8,7 @@ import java.util.stream.*;
  * Runs in the child JVM: calls the entry points its arguments name, in order (debug, hwinfo,
  * exit; blink:SLOT:STATE) and prints "key=value" for those with a result: version, status,
  * inventories (the lengths of the eight), json (the agent's document on one line, from a whole
- * lifecycle of its own) and children (after 1.5 s, the child processes of this JVM, zombies
+ * lifecycle of its own), doc (the document of the last acquisition) and children (after 1.5 s, the child processes of this JVM, zombies
  * included: long enough for the monitor stand-ins to have run and ended).
  */
 final class Scenario {
@@ -32,6 +32,8 @@ final class Scenario {
                 // JSON needs no line ends: strings carry theirs escaped.
                 case "json" -> System.out.println(
                     "json=" + JsonWriter.write(Inventory.collect(agent)).replace("\n", ""));
+                case "doc" -> System.out.println(
+                    "doc=" + JsonWriter.write(Inventory.read(agent)).replace("\n", ""));
                 case "blink" -> agent.BlinkCmd(Long.parseLong(parts[1]), Integer.parseInt(parts[2]));
                 case "children" -> {
                     Thread.sleep(1500);
