@@ -67,18 +67,18 @@ void Target(int fd, char* target, size_t size) {
     target[length > 0 ? length : 0] = '\0';
 }
 
-bool ParseSpec(const char* spec) {
-    if (std::strcmp(spec, "count") == 0) {
+bool ParseFault(const char* fault) {
+    if (std::strcmp(fault, "count") == 0) {
         return true;
     }
-    const char* colon = std::strchr(spec, ':');
+    const char* colon = std::strchr(fault, ':');
     if (colon == nullptr) {
         return false;
     }
     for (size_t i = 0; i < std::size(KIND_NAMES); ++i) {
         const size_t length = std::strlen(KIND_NAMES[i]);
-        if (static_cast<size_t>(colon - spec) == length &&
-            std::strncmp(spec, KIND_NAMES[i], length) == 0) {
+        if (static_cast<size_t>(colon - fault) == length &&
+            std::strncmp(fault, KIND_NAMES[i], length) == 0) {
             char* end = nullptr;
             const unsigned long point = std::strtoul(colon + 1, &end, 10);
             if (*end != '\0' || point == 0 || point > UINT32_MAX) {
@@ -93,17 +93,17 @@ bool ParseSpec(const char* spec) {
 }
 
 __attribute__((constructor)) void StartFaults() {
-    const char* spec = std::getenv("VELHSIM_FAULT");
+    const char* fault = std::getenv("VELHSIM_FAULT");
     const char* run = std::getenv("VELHSIM_RUN");
-    if (spec == nullptr || *spec == '\0' || run == nullptr || *run != '/') {
+    if (fault == nullptr || *fault == '\0' || run == nullptr || *run != '/') {
         return;
     }
-    if (!ParseSpec(spec)) {
+    if (!ParseFault(fault)) {
         std::fprintf(stderr,
                      "velhsim: VELHSIM_FAULT=%s: not \"count\" or KIND:N with N from 1 (kinds: "
                      "driver query_module module_growth uname getcwd scandir fork exec short "
                      "partial)\n",
-                     spec);
+                     fault);
         return;
     }
     void* shared = mmap(nullptr, sizeof(uint32_t) * std::size(KIND_NAMES), PROT_READ | PROT_WRITE,
