@@ -14,6 +14,10 @@ extern "C" {
 // alike in both.
 __asm__(".symver __isoc99_sscanf,sscanf@GLIBC_2.0");
 
+// fcntl became a GLIBC_2.28 symbol when it learnt the 64-bit lock commands; the descriptor flags
+// that we set read alike through the original one.
+__asm__(".symver fcntl,fcntl@GLIBC_2.0");
+
 // stat64 and its siblings became functions of their own in GLIBC_2.33; before, they were inline
 // calls of the versioned __xstat64 family (structure version 3 on 32-bit x86).
 int __xstat64(int version, const char* path, struct stat64* status);
