@@ -15,9 +15,9 @@
 #include "fake_modules.h"
 #include "hw/hwinfo.h"
 #include "model/hwobjects.h"
+#include "runtime/heap.h"
 #include "scratchdir.h"
 #include "setup/linsetup.h"
-#include "runtime/heap.h"
 
 namespace {
 
